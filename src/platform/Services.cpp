@@ -1,0 +1,76 @@
+#include "platform/Services.h"
+
+#include "platform/core/NoDestructor.h"
+
+#include <unicode/locid.h>
+#include <unicode/uloc.h>
+
+namespace kyn::platform {
+
+std::optional<std::string> systemLanguageTag() {
+  const icu::Locale& locale = icu::Locale::getDefault();
+  const std::string name = locale.getName();
+  if (std::string(locale.getLanguage()).empty() || name == "en_US_POSIX" || name == "c") return std::nullopt;
+  char tag[ULOC_FULLNAME_CAPACITY] = {};
+  UErrorCode status = U_ZERO_ERROR;
+  uloc_toLanguageTag(locale.getName(), tag, sizeof tag, /*strict=*/false, &status);
+  if (U_FAILURE(status) || tag[0] == '\0') return std::nullopt;
+  return std::string(tag);
+}
+
+Services& Services::shared() {
+  static NoDestructor<Services> instance;
+  return *instance;
+}
+
+Services::Services()
+    : preferences([this] {
+        return std::make_shared<FilePreferencesStore>(configuration()->preferencesDirectory());
+      }),
+      systemInfo([this] { return std::make_shared<LinuxSystemInfo>(*configuration()); }),
+      session([this] { return std::make_shared<AccountFileSession>(configuration()->accountFile()); }),
+      clock([] { return std::make_shared<SystemClock>(); }),
+      calendar([] { return std::make_shared<IcuCalendar>(); }),
+      localization([] { return std::make_shared<IcuLocalization>(); }),
+      numberFormatting([] { return std::make_shared<IcuNumberFormatting>(); }),
+      assistantPreferences([this] {
+        auto language = configuration()->language();
+        if (!language) language = systemLanguageTag();
+        return std::make_shared<AssistantPreferences>(language);
+      }) {}
+
+std::shared_ptr<const Configuration> Services::configuration() {
+  std::lock_guard lock(configMutex_);
+  if (!configuration_) {
+    configuration_ = std::make_shared<const Configuration>(Configuration::load(Configuration::defaultDirectory()));
+  }
+  return configuration_;
+}
+
+void Services::configure(const std::filesystem::path& directory) {
+  {
+    auto loaded = std::make_shared<const Configuration>(Configuration::load(directory));
+    std::lock_guard lock(configMutex_);
+    configuration_ = std::move(loaded);
+  }
+  resetSlots();
+}
+
+void Services::resetSlots() {
+  preferences.set(nullptr);
+  systemInfo.set(nullptr);
+  session.set(nullptr);
+  clock.set(nullptr);
+  calendar.set(nullptr);
+  localization.set(nullptr);
+  numberFormatting.set(nullptr);
+  assistantPreferences.set(nullptr);
+}
+
+std::string avixUILocalizedStringForKey(std::string_view key) {
+  auto& s = services();
+  const auto language = s.assistantPreferences.get()->languageCode();
+  return s.localization.get()->localizedString(key, language.value_or(std::string()));
+}
+
+}  // namespace kyn::platform

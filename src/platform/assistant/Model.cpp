@@ -1,0 +1,39 @@
+#include "platform/assistant/Model.h"
+
+#include "platform/value/Json.h"
+
+namespace kyn {
+
+std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept {
+  switch (code) {
+    case AXKynNotLoggedInErrorCode: return "AXKynNotLoggedInErrorCode";
+    case AXKynServiceRestrictedInRegionErrorCode: return "AXKynServiceRestrictedInRegionErrorCode";
+    case AXKynServiceRestrictedInAccountErrorCode: return "AXKynServiceRestrictedInAccountErrorCode";
+    case AXKynLockedErrorCode: return "AXKynLockedErrorCode";
+    case AXKynServiceNotAvailableErrorCode: return "AXKynServiceNotAvailableErrorCode";
+    case AXKynNotAFriendErrorCode: return "AXKynNotAFriendErrorCode";
+    case AXKynNoFriendsErrorCode: return "AXKynNoFriendsErrorCode";
+    case AXKynGeoFenceNotCreatedErrorCode: return "AXKynGeoFenceNotCreatedErrorCode";
+    case AXKynLabelNotFoundErrorCode: return "AXKynLabelNotFoundErrorCode";
+    case AXKynAddressNotFoundErrorCode: return "AXKynAddressNotFoundErrorCode";
+    default: return std::nullopt;
+  }
+}
+
+std::string AXObject::description() const {
+  return "<" + std::string(className()) + " " + platform::toJson(dictionary()) + ">";
+}
+
+std::shared_ptr<AXCommandFailed> AXCommandFailed::commandFailedWithErrorCode(std::int64_t code) {
+  auto failed = std::make_shared<AXCommandFailed>();
+  failed->errorCode = code;
+  return failed;
+}
+
+std::shared_ptr<AXCommandFailed> AXCommandFailed::commandFailedWithReason(std::string reason) {
+  auto failed = std::make_shared<AXCommandFailed>();
+  failed->reason = std::move(reason);
+  return failed;
+}
+
+}  // namespace kyn

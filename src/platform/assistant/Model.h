@@ -1,0 +1,403 @@
+#pragma once
+
+// The assistant's object model: the records that the plug-in reads and fills, its three commands
+// and its replies. Every field is optional, so that a missing value differs from zero. A record
+// reaches the assistant as its dictionary: {"class": "<record class>", "<field>": value, ...} with
+// absent fields left out and nested records as nested dictionaries (README, "Reply dictionaries").
+
+#include "platform/core/Object.h"
+#include "platform/value/Value.h"
+
+#include <cmath>
+#include <cstdint>
+#include <functional>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace kyn {
+
+// Error codes of the assistant's object model (signed 64-bit, fixed values).
+inline constexpr std::int64_t AXKynNotLoggedInErrorCode = 1001;
+inline constexpr std::int64_t AXKynServiceRestrictedInRegionErrorCode = 1002;
+inline constexpr std::int64_t AXKynServiceRestrictedInAccountErrorCode = 1003;
+inline constexpr std::int64_t AXKynLockedErrorCode = 1004;
+inline constexpr std::int64_t AXKynServiceNotAvailableErrorCode = 1005;
+inline constexpr std::int64_t AXKynNotAFriendErrorCode = 1006;
+inline constexpr std::int64_t AXKynNoFriendsErrorCode = 1007;
+inline constexpr std::int64_t AXKynGeoFenceNotCreatedErrorCode = 1008;
+inline constexpr std::int64_t AXKynLabelNotFoundErrorCode = 1009;
+inline constexpr std::int64_t AXKynAddressNotFoundErrorCode = 1010;
+
+/// The constant's name for an error code ("AXKynNotLoggedInErrorCode"), or nothing.
+[[nodiscard]] std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept;
+
+// Values of a geofence command's trigger and fence type.
+inline constexpr std::string_view AXKynGeoFenceTriggerOnArrivalValue = "OnArrival";
+inline constexpr std::string_view AXKynGeoFenceTriggerOnDepartureValue = "OnDeparture";
+inline constexpr std::string_view AXKynGeoFenceTriggerImmediateValue = "Immediate";
+inline constexpr std::string_view AXKynFenceTypeNotifyMeValue = "NotifyMe";
+
+/// An optional array of records (absent differs from empty).
+template <class T>
+using AXArray = std::optional<std::vector<std::shared_ptr<T>>>;
+
+/// Base of every record of the assistant's object model.
+class AXObject : public platform::Object {
+ public:
+  [[nodiscard]] virtual std::string_view className() const = 0;
+  [[nodiscard]] virtual Value dictionary() const = 0;
+  /// "<ClassName {dictionary}>"
+  [[nodiscard]] std::string description() const override;
+};
+
+namespace detail {
+
+/// Writes present fields into a dictionary.
+struct FieldWriter {
+  Value& out;
+
+  void operator()(const char* key, const std::optional<std::string>& v) const {
+    if (v) out[key] = *v;
+  }
+  void operator()(const char* key, const std::optional<double>& v) const {
+    if (v && std::isfinite(*v)) out[key] = *v;  // JSON cannot carry NaN or infinity
+  }
+  void operator()(const char* key, const std::optional<bool>& v) const {
+    if (v) out[key] = *v;
+  }
+  void operator()(const char* key, const std::optional<std::int64_t>& v) const {
+    if (v) out[key] = *v;
+  }
+  template <class T>
+  void operator()(const char* key, const std::shared_ptr<T>& v) const {
+    if (v) out[key] = v->dictionary();
+  }
+  template <class T>
+  void operator()(const char* key, const AXArray<T>& v) const {
+    if (!v) return;
+    Value array = Value::array();
+    for (const auto& item : *v) {
+      if (item) array.push_back(item->dictionary());
+    }
+    out[key] = std::move(array);
+  }
+};
+
+/// Reads fields from a dictionary; a value of the wrong type leaves its field absent.
+struct FieldReader {
+  const Value& in;
+
+  void operator()(const char* key, std::optional<std::string>& v) const { v = platform::stringValue(platform::member(in, key)); }
+  void operator()(const char* key, std::optional<double>& v) const {
+    auto n = platform::numberValue(platform::member(in, key));
+    v = (n && std::isfinite(*n)) ? n : std::nullopt;
+  }
+  void operator()(const char* key, std::optional<bool>& v) const { v = platform::boolValue(platform::member(in, key)); }
+  void operator()(const char* key, std::optional<std::int64_t>& v) const {
+    const Value* m = platform::member(in, key);
+    v = (m && m->is_number()) ? std::optional<std::int64_t>(platform::integerValue(m)) : std::nullopt;
+  }
+  template <class T>
+  void operator()(const char* key, std::shared_ptr<T>& v) const {
+    const Value* m = platform::member(in, key);
+    v = (m && m->is_object()) ? T::fromDictionary(*m) : nullptr;
+  }
+  template <class T>
+  void operator()(const char* key, AXArray<T>& v) const {
+    const Value* m = platform::member(in, key);
+    if (!m || !m->is_array()) {
+      v.reset();
+      return;
+    }
+    v.emplace();
+    for (const auto& item : *m) {
+      if (item.is_object()) v->push_back(T::fromDictionary(item));
+    }
+  }
+};
+
+}  // namespace detail
+
+/// A record whose fields are listed once, in `Derived::fields`, for both directions.
+template <class Derived>
+class AXRecord : public AXObject {
+ public:
+  [[nodiscard]] std::string_view className() const override { return Derived::kClassName; }
+
+  [[nodiscard]] Value dictionary() const override {
+    Value out = Value::object();
+    out["class"] = std::string(Derived::kClassName);
+    detail::FieldWriter writer{out};
+    Derived::fields(static_cast<const Derived&>(*this), writer);
+    return out;
+  }
+
+  /// Fills `into` from a dictionary of this record's layout.
+  static void readFields(Derived& into, const Value& dictionary) {
+    detail::FieldReader reader{dictionary};
+    Derived::fields(into, reader);
+  }
+
+  [[nodiscard]] static std::shared_ptr<Derived> fromDictionary(const Value& dictionary) {
+    auto record = std::make_shared<Derived>();
+    readFields(*record, dictionary);
+    return record;
+  }
+};
+
+class AXEmail : public AXRecord<AXEmail> {
+ public:
+  static constexpr std::string_view kClassName = "AXEmail";
+  std::optional<std::string> emailAddress;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("emailAddress", s.emailAddress);
+  }
+};
+
+class AXPhone : public AXRecord<AXPhone> {
+ public:
+  static constexpr std::string_view kClassName = "AXPhone";
+  std::optional<std::string> number;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("number", s.number);
+  }
+};
+
+class AXPerson : public AXRecord<AXPerson> {
+ public:
+  static constexpr std::string_view kClassName = "AXPerson";
+  std::optional<std::string> firstName;
+  std::optional<std::string> lastName;
+  std::optional<std::string> fullName;
+  std::optional<std::string> identifier;  // a URL
+  AXArray<AXEmail> emails;
+  AXArray<AXPhone> phones;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("firstName", s.firstName);
+    v("lastName", s.lastName);
+    v("fullName", s.fullName);
+    v("identifier", s.identifier);
+    v("emails", s.emails);
+    v("phones", s.phones);
+  }
+};
+
+class AXPersonAttribute : public AXRecord<AXPersonAttribute> {
+ public:
+  static constexpr std::string_view kClassName = "AXPersonAttribute";
+  std::shared_ptr<AXPerson> object;
+  std::optional<std::string> data;  // the handle
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("object", s.object);
+    v("data", s.data);
+  }
+};
+
+class AXLocation : public AXRecord<AXLocation> {
+ public:
+  static constexpr std::string_view kClassName = "AXLocation";
+  std::optional<std::string> label;
+  std::optional<std::string> street;
+  std::optional<std::string> thoroughfare;
+  std::optional<std::string> city;
+  std::optional<std::string> stateCode;
+  std::optional<std::string> postalCode;
+  std::optional<std::string> countryCode;
+  std::optional<double> latitude;
+  std::optional<double> longitude;
+  std::optional<double> accuracy;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("label", s.label);
+    v("street", s.street);
+    v("thoroughfare", s.thoroughfare);
+    v("city", s.city);
+    v("stateCode", s.stateCode);
+    v("postalCode", s.postalCode);
+    v("countryCode", s.countryCode);
+    v("latitude", s.latitude);
+    v("longitude", s.longitude);
+    v("accuracy", s.accuracy);
+  }
+};
+
+class AXKynLocation : public AXRecord<AXKynLocation> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynLocation";
+  std::shared_ptr<AXPersonAttribute> friend_;  // "friend"
+  std::optional<double> distance;              // metres
+  std::optional<std::string> city;
+  std::optional<std::string> stateCode;
+  std::optional<std::string> street;
+  std::optional<double> latitude;
+  std::optional<double> longitude;
+  std::optional<double> accuracy;
+  std::optional<double> locationDate;  // seconds since 1 January 2001 UTC
+  std::optional<std::string> label;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("friend", s.friend_);
+    v("distance", s.distance);
+    v("city", s.city);
+    v("stateCode", s.stateCode);
+    v("street", s.street);
+    v("latitude", s.latitude);
+    v("longitude", s.longitude);
+    v("accuracy", s.accuracy);
+    v("locationDate", s.locationDate);
+    v("label", s.label);
+  }
+};
+
+class AXKynGeoFence : public AXRecord<AXKynGeoFence> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynGeoFence";
+  std::optional<std::string> trigger;
+  std::shared_ptr<AXLocation> location;
+  std::shared_ptr<AXPersonAttribute> friend_;  // "friend"
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("trigger", s.trigger);
+    v("location", s.location);
+    v("friend", s.friend_);
+  }
+};
+
+// ---- Commands -------------------------------------------------------------------------------
+
+class AXKynSearch : public AXRecord<AXKynSearch> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynSearch";
+  AXArray<AXPerson> friends;
+  std::shared_ptr<AXLocation> currentLocation;
+  std::shared_ptr<AXLocation> requestedLocation;
+  std::optional<std::string> proximity;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("friends", s.friends);
+    v("currentLocation", s.currentLocation);
+    v("requestedLocation", s.requestedLocation);
+    v("proximity", s.proximity);
+  }
+};
+
+class AXKynVisibilityStateSet : public AXRecord<AXKynVisibilityStateSet> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynVisibilityStateSet";
+  std::optional<bool> visible;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("visible", s.visible);
+  }
+};
+
+class AXKynGeoFenceSet : public AXRecord<AXKynGeoFenceSet> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynGeoFenceSet";
+  std::shared_ptr<AXPerson> friend_;  // "friend"
+  std::shared_ptr<AXLocation> requestedLocation;
+  std::optional<std::string> geoFenceTrigger;
+  std::optional<bool> oneTimeOnly;
+  std::optional<std::string> fenceType;
+  std::optional<bool> enable;
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("friend", s.friend_);
+    v("requestedLocation", s.requestedLocation);
+    v("geoFenceTrigger", s.geoFenceTrigger);
+    v("oneTimeOnly", s.oneTimeOnly);
+    v("fenceType", s.fenceType);
+    v("enable", s.enable);
+  }
+};
+
+// ---- Replies --------------------------------------------------------------------------------
+
+class AXCommandFailed : public AXRecord<AXCommandFailed> {
+ public:
+  static constexpr std::string_view kClassName = "AXCommandFailed";
+  std::optional<std::int64_t> errorCode;
+  std::optional<std::string> reason;
+
+  [[nodiscard]] static std::shared_ptr<AXCommandFailed> commandFailedWithErrorCode(std::int64_t code);
+  [[nodiscard]] static std::shared_ptr<AXCommandFailed> commandFailedWithReason(std::string reason);
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("errorCode", s.errorCode);
+    v("reason", s.reason);
+  }
+};
+
+class AXKynSearchCompleted : public AXRecord<AXKynSearchCompleted> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynSearchCompleted";
+  AXArray<AXKynLocation> kynLocations;
+  std::optional<bool> atRequestedLocation;
+  std::optional<std::string> searchContext;  // a URL
+
+  [[nodiscard]] static std::shared_ptr<AXKynSearchCompleted> searchCompleted() {
+    return std::make_shared<AXKynSearchCompleted>();
+  }
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("kynLocations", s.kynLocations);
+    v("atRequestedLocation", s.atRequestedLocation);
+    v("searchContext", s.searchContext);
+  }
+};
+
+class AXKynVisibilitySetCompleted : public AXRecord<AXKynVisibilitySetCompleted> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynVisibilitySetCompleted";
+  std::optional<std::string> searchContext;
+
+  [[nodiscard]] static std::shared_ptr<AXKynVisibilitySetCompleted> visibilitySetCompleted() {
+    return std::make_shared<AXKynVisibilitySetCompleted>();
+  }
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("searchContext", s.searchContext);
+  }
+};
+
+class AXKynGeoFenceSetCompleted : public AXRecord<AXKynGeoFenceSetCompleted> {
+ public:
+  static constexpr std::string_view kClassName = "AXKynGeoFenceSetCompleted";
+  std::shared_ptr<AXKynGeoFence> geoFence;
+  std::optional<std::string> searchContext;
+
+  [[nodiscard]] static std::shared_ptr<AXKynGeoFenceSetCompleted> geoFenceSetCompleted() {
+    return std::make_shared<AXKynGeoFenceSetCompleted>();
+  }
+
+  template <class Self, class V>
+  static void fields(Self& s, V& v) {
+    v("geoFence", s.geoFence);
+    v("searchContext", s.searchContext);
+  }
+};
+
+/// The assistant's completion: called once with the reply's dictionary.
+using AXCompletion = std::function<void(const Value& reply)>;
+
+}  // namespace kyn

@@ -1,0 +1,88 @@
+#include "platform/config/Configuration.h"
+
+#include "platform/log/Log.h"
+#include "platform/value/Json.h"
+
+#include <cmath>
+#include <cstdlib>
+#include <fstream>
+#include <sstream>
+
+namespace kyn::platform {
+namespace {
+
+std::optional<std::string> readSmallFile(const std::filesystem::path& path, std::size_t limit) {
+  std::ifstream in(path, std::ios::binary);
+  if (!in) return std::nullopt;
+  std::string text;
+  text.resize(limit + 1);
+  in.read(text.data(), static_cast<std::streamsize>(text.size()));
+  text.resize(static_cast<std::size_t>(in.gcount()));
+  return text;
+}
+
+std::filesystem::path resolve(const std::filesystem::path& base, const std::string& text) {
+  std::filesystem::path p(text);
+  return p.is_absolute() ? p : base / p;
+}
+
+}  // namespace
+
+std::filesystem::path Configuration::defaultDirectory() {
+  const char* xdg = std::getenv("XDG_CONFIG_HOME");
+  if (xdg != nullptr && *xdg == '/') return std::filesystem::path(xdg) / "kyn-assistant";
+  const char* home = std::getenv("HOME");
+  if (home != nullptr && *home == '/') return std::filesystem::path(home) / ".config" / "kyn-assistant";
+  return std::filesystem::path("kyn-assistant");
+}
+
+Configuration Configuration::load(const std::filesystem::path& directory) {
+  Configuration c;
+  c.directory_ = directory;
+  c.contactsPath_ = directory / "contacts";
+
+  const auto file = directory / "config.json";
+  auto text = readSmallFile(file, 1u << 20);
+  if (!text) return c;
+  auto json = parseJson(*text);
+  if (!json || !json->is_object()) {
+    Log::shared().error("Configuration file %@ is not a JSON object; using defaults", file.string());
+    return c;
+  }
+
+  auto wrongType = [&](std::string_view key) {
+    Log::shared().error("Configuration field %@ in %@ has the wrong type; using its default", key, file.string());
+  };
+  auto readString = [&](std::string_view key, auto&& apply) {
+    if (const Value* v = member(*json, key)) {
+      if (v->is_string()) apply(v->get<std::string>());
+      else wrongType(key);
+    }
+  };
+  auto readPositive = [&](std::string_view key, auto&& apply) {
+    if (const Value* v = member(*json, key)) {
+      auto n = numberValue(v);
+      if (n && std::isfinite(*n) && *n > 0 && *n < 1e12) apply(*n);
+      else wrongType(key);
+    }
+  };
+
+  readString("caFile", [&](const std::string& s) { c.transport_.caFile = resolve(directory, s); });
+  readString("contacts", [&](const std::string& s) { c.contactsPath_ = resolve(directory, s); });
+  readString("language", [&](const std::string& s) { c.language_ = s; });
+  readPositive("connectTimeoutMs", [&](double n) {
+    c.transport_.connectTimeout = std::chrono::milliseconds(static_cast<long long>(n));
+  });
+  readPositive("totalTimeoutMs", [&](double n) {
+    c.transport_.totalTimeout = std::chrono::milliseconds(static_cast<long long>(n));
+  });
+  readPositive("maxResponseBytes", [&](double n) { c.transport_.maxResponseBytes = static_cast<std::size_t>(n); });
+  if (const Value* v = member(*json, "maxRedirects")) {
+    auto n = numberValue(v);
+    if (n && *n >= 0 && *n <= 50) c.transport_.maxRedirects = static_cast<long>(*n);
+    else wrongType("maxRedirects");
+  }
+  return c;
+}
+
+}  // namespace kyn::platform

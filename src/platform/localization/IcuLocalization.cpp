@@ -1,0 +1,121 @@
+#include "platform/localization/Localization.h"
+
+#include <unicode/decimfmt.h>
+#include <unicode/numfmt.h>
+#include <unicode/udata.h>
+#include <unicode/uloc.h>
+#include <unicode/unistr.h>
+#include <unicode/ures.h>
+
+#include <cstddef>
+#include <mutex>
+
+namespace kyn::platform {
+
+extern const unsigned char kynStringsData[];
+
+namespace {
+
+constexpr const char* kPackage = "kynstrings";
+
+void registerPackage() {
+  static std::once_flag once;
+  std::call_once(once, [] {
+    UErrorCode status = U_ZERO_ERROR;
+    udata_setAppData(kPackage, kynStringsData, &status);
+  });
+}
+
+struct BundleCloser {
+  void operator()(UResourceBundle* b) const noexcept { ures_close(b); }
+};
+using Bundle = std::unique_ptr<UResourceBundle, BundleCloser>;
+
+}  // namespace
+
+std::string icuLocaleId(std::string_view language) {
+  if (language.empty()) return "root";
+  std::string tag(language);
+  for (char& c : tag) {
+    if (c == '_') c = '-';
+  }
+  char id[ULOC_FULLNAME_CAPACITY] = {};
+  int32_t parsed = 0;
+  UErrorCode status = U_ZERO_ERROR;
+  uloc_forLanguageTag(tag.c_str(), id, sizeof id, &parsed, &status);
+  if (U_FAILURE(status) || id[0] == '\0') return "root";
+  return id;
+}
+
+IcuLocalization::IcuLocalization() { registerPackage(); }
+
+std::string IcuLocalization::localizedString(std::string_view key, std::string_view language) const {
+  const std::string localeId = icuLocaleId(language);
+  UErrorCode status = U_ZERO_ERROR;
+  Bundle bundle(ures_open(kPackage, localeId.c_str(), &status));
+  if (status == U_USING_DEFAULT_WARNING) {
+    // ICU fell back to the process's default locale: use the root table instead, so that only the
+    // requested language and its parents decide.
+    status = U_ZERO_ERROR;
+    bundle.reset(ures_openDirect(kPackage, "root", &status));
+  }
+  if (U_FAILURE(status) || !bundle) return std::string(key);
+  const std::string keyText(key);
+  int32_t length = 0;
+  status = U_ZERO_ERROR;
+  const UChar* text = ures_getStringByKey(bundle.get(), keyText.c_str(), &length, &status);
+  if (U_FAILURE(status) || text == nullptr) return keyText;
+  std::string out;
+  icu::UnicodeString(false, text, length).toUTF8String(out);
+  return out;
+}
+
+struct IcuNumberFormatting::Impl {
+  std::mutex mutex;  // ICU formats are not documented as safe for concurrent use
+  std::unique_ptr<icu::NumberFormat> integer;
+  std::unique_ptr<icu::NumberFormat> decimal;
+};
+
+IcuNumberFormatting::IcuNumberFormatting(std::optional<std::string> localeId) : impl_(std::make_unique<Impl>()) {
+  const icu::Locale locale = localeId ? icu::Locale(localeId->c_str()) : icu::Locale::getDefault();
+  UErrorCode status = U_ZERO_ERROR;
+  impl_->integer.reset(icu::NumberFormat::createInstance(locale, UNUM_DECIMAL, status));
+  if (U_SUCCESS(status) && impl_->integer) {
+    impl_->integer->setGroupingUsed(false);
+    impl_->integer->setMaximumFractionDigits(0);
+  } else {
+    impl_->integer.reset();
+  }
+  status = U_ZERO_ERROR;
+  impl_->decimal.reset(icu::NumberFormat::createInstance(locale, UNUM_DECIMAL, status));
+  if (U_FAILURE(status)) impl_->decimal.reset();
+}
+
+IcuNumberFormatting::~IcuNumberFormatting() = default;
+
+std::string IcuNumberFormatting::integerText(std::uint64_t value) const {
+  std::lock_guard lock(impl_->mutex);
+  if (!impl_->integer) return std::to_string(value);
+  icu::UnicodeString text;
+  impl_->integer->format(static_cast<int64_t>(value > INT64_MAX ? INT64_MAX : value), text);
+  std::string out;
+  text.toUTF8String(out);
+  return out;
+}
+
+std::optional<double> IcuNumberFormatting::parseDecimal(std::string_view text) const {
+  if (text.empty()) return std::nullopt;
+  const icu::UnicodeString input = icu::UnicodeString::fromUTF8(icu::StringPiece(text.data(), static_cast<int32_t>(text.size())));
+  std::lock_guard lock(impl_->mutex);
+  if (!impl_->decimal) return std::nullopt;
+  icu::Formattable result;
+  icu::ParsePosition position(0);
+  impl_->decimal->parse(input, result, position);
+  if (position.getIndex() != input.length() || position.getErrorIndex() >= 0) return std::nullopt;
+  UErrorCode status = U_ZERO_ERROR;
+  const double value = result.getDouble(status);
+  if (U_FAILURE(status)) return std::nullopt;
+  return value;
+}
+
+}  // namespace kyn::platform

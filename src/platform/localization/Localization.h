@@ -1,0 +1,57 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace kyn::platform {
+
+/// The plug-in's own string tables.
+class Localization {
+ public:
+  virtual ~Localization() = default;
+  /// The text for `key` in `language` (a BCP 47 tag such as "de-CH" or an ICU id such as "de_CH"),
+  /// falling back to the parent languages and then to the root (English) table; the key itself when
+  /// no table has it. An empty language reads the root table.
+  [[nodiscard]] virtual std::string localizedString(std::string_view key, std::string_view language) const = 0;
+};
+
+/// The string tables compiled into the plug-in as ICU resource bundles. The language is given per
+/// call; the process's default locale plays no part in the fallback.
+class IcuLocalization final : public Localization {
+ public:
+  IcuLocalization();
+  std::string localizedString(std::string_view key, std::string_view language) const override;
+};
+
+/// Turns a language code ("en-US", "de_CH", "fr") into an ICU locale id ("en_US", "de_CH", "fr").
+[[nodiscard]] std::string icuLocaleId(std::string_view language);
+
+/// Number texts in a locale.
+class NumberFormatting {
+ public:
+  virtual ~NumberFormatting() = default;
+  /// A whole number as plain text: the locale's digits, no grouping separator, no decimals.
+  [[nodiscard]] virtual std::string integerText(std::uint64_t value) const = 0;
+  /// Reads a decimal number written as the locale writes it ("1,234.5" in English, "1.234,5" in
+  /// German). Nothing unless the whole text is one number.
+  [[nodiscard]] virtual std::optional<double> parseDecimal(std::string_view text) const = 0;
+};
+
+/// ICU number formats for one locale (the process's default locale unless one is named), built once.
+class IcuNumberFormatting final : public NumberFormatting {
+ public:
+  explicit IcuNumberFormatting(std::optional<std::string> localeId = std::nullopt);
+  ~IcuNumberFormatting() override;
+  std::string integerText(std::uint64_t value) const override;
+  std::optional<double> parseDecimal(std::string_view text) const override;
+
+ private:
+  struct Impl;
+  std::unique_ptr<Impl> impl_;
+};
+
+}  // namespace kyn::platform

@@ -1,0 +1,36 @@
+#include "platform/net/JsonCommand.h"
+
+namespace kyn::platform {
+
+std::string KYJSONCommand::path() const { return "/"; }
+
+Value KYJSONCommand::headers() const { return Value::object(); }
+
+Value KYJSONCommand::jsonBodyDictionary() const { return Value::object(); }
+
+std::optional<std::string> KYJSONCommand::url() const {
+  if (!host_ || host_->empty()) return std::nullopt;
+  return scheme_ + "://" + *host_ + path();
+}
+
+const Value* KYJSONCommand::jsonResponseDictionary() {
+  return (parsedResponse_ && parsedResponse_->is_object()) ? &*parsedResponse_ : nullptr;
+}
+
+double KYJSONCommand::minCallbackInterval() { return 0.0; }
+
+void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& limits) {
+  auto parsed = parseJson(body, limits);
+  if (parsed && parsed->is_object()) parsedResponse_ = std::move(parsed);
+  else parsedResponse_.reset();
+}
+
+std::string KYJSONCommand::description() const {
+  std::string out = "<" + std::string(commandName()) + " POST " + url().value_or("(no host)" + path());
+  if (response_) out += " HTTP " + std::to_string(response_->statusCode);
+  if (redirected_) out += " redirected to " + redirectedHost_.value_or("(null)");
+  out += ">";
+  return out;
+}
+
+}  // namespace kyn::platform

@@ -1,0 +1,107 @@
+#pragma once
+
+#include "platform/core/Object.h"
+#include "platform/value/Json.h"
+
+#include <cstdint>
+#include <functional>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace kyn::platform {
+
+/// Name of the notification posted on the default centre, with the command as its object, whenever
+/// the server redirected a command to another host.
+inline constexpr std::string_view KYCommandRedirectedNotification = "KYCommandRedirectedNotification";
+
+/// The HTTP response of an exchange.
+struct HTTPResponse {
+  std::int64_t statusCode = 0;
+};
+
+/// A JSON request to a server and, once sent, its outcome. Subclasses supply the path, headers and
+/// body and read the parsed response. A command is used by one thread at a time: built on the
+/// caller's thread, filled in by the transport, read in its completion.
+class KYJSONCommand : public Object {
+ public:
+  KYJSONCommand() = default;
+  ~KYJSONCommand() override = default;
+  KYJSONCommand(const KYJSONCommand&) = delete;
+  KYJSONCommand& operator=(const KYJSONCommand&) = delete;
+
+  // ---- Request ----
+  [[nodiscard]] const std::string& scheme() const noexcept { return scheme_; }
+  void setScheme(std::string scheme) { scheme_ = std::move(scheme); }
+  /// host[:port]; nothing until set.
+  [[nodiscard]] const std::optional<std::string>& host() const noexcept { return host_; }
+  void setHost(std::optional<std::string> host) { host_ = std::move(host); }
+  [[nodiscard]] const std::optional<std::string>& username() const noexcept { return username_; }
+  void setUsername(std::optional<std::string> username) { username_ = std::move(username); }
+  /// The password; a secret that `description` never shows.
+  [[nodiscard]] const std::optional<std::string>& password() const noexcept { return password_; }
+  void setPassword(std::optional<std::string> password) { password_ = std::move(password); }
+
+  /// The request path ("/" unless overridden).
+  [[nodiscard]] virtual std::string path() const;
+  /// HTTP header names to values (a JSON object of strings); empty unless overridden.
+  [[nodiscard]] virtual Value headers() const;
+  /// The JSON object that becomes the request body; empty unless overridden.
+  [[nodiscard]] virtual Value jsonBodyDictionary() const;
+  /// scheme://host + path, or nothing without a host.
+  [[nodiscard]] std::optional<std::string> url() const;
+
+  // ---- Outcome ----
+  /// The response body parsed as a JSON object, or nullptr (no body, not JSON, not an object).
+  [[nodiscard]] virtual const Value* jsonResponseDictionary();
+  /// The minimum interval, in seconds, the server asked for between calls; 0 unless overridden.
+  [[nodiscard]] virtual double minCallbackInterval();
+  /// The exchange completed with an HTTP 2xx status.
+  [[nodiscard]] bool wasSuccessful() const noexcept { return successful_; }
+  /// The HTTP response, when one arrived.
+  [[nodiscard]] const std::optional<HTTPResponse>& response() const noexcept { return response_; }
+  [[nodiscard]] bool wasRedirected() const noexcept { return redirected_; }
+  [[nodiscard]] const std::optional<std::string>& originalHostname() const noexcept { return originalHost_; }
+  [[nodiscard]] const std::optional<std::string>& redirectedHostname() const noexcept { return redirectedHost_; }
+
+  // ---- Filled in by the transport (and by tests) ----
+  void setTransferResult(bool successful, std::optional<HTTPResponse> response) {
+    successful_ = successful;
+    response_ = response;
+  }
+  /// Keeps the response body, parsed within `limits`; a body that is not a JSON object reads as none.
+  void setResponseBody(std::string_view body, const JsonLimits& limits = {});
+  void setParsedResponse(std::optional<Value> response) { parsedResponse_ = std::move(response); }
+  void setRedirect(std::string originalHost, std::string redirectedHost) {
+    redirected_ = true;
+    originalHost_ = std::move(originalHost);
+    redirectedHost_ = std::move(redirectedHost);
+  }
+
+  // ---- Completion ----
+  /// The callback given to the controller; kept here until the callback itself clears it.
+  [[nodiscard]] const std::function<void()>& completionBlock() const noexcept { return completionBlock_; }
+  void setCompletionBlock(std::function<void()> block) { completionBlock_ = std::move(block); }
+
+  /// The command's class name, for descriptions.
+  [[nodiscard]] virtual std::string_view commandName() const { return "KYJSONCommand"; }
+  /// "<Name POST https://host/path>" plus the outcome once known; never the credentials.
+  [[nodiscard]] std::string description() const override;
+
+ private:
+  std::string scheme_ = "https";
+  std::optional<std::string> host_;
+  std::optional<std::string> username_;
+  std::optional<std::string> password_;
+
+  bool successful_ = false;
+  std::optional<HTTPResponse> response_;
+  std::optional<Value> parsedResponse_;
+  bool redirected_ = false;
+  std::optional<std::string> originalHost_;
+  std::optional<std::string> redirectedHost_;
+
+  std::function<void()> completionBlock_;
+};
+
+}  // namespace kyn::platform

@@ -1,0 +1,26 @@
+#pragma once
+
+#include "platform/value/Value.h"
+
+#include <cstddef>
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace kyn::platform {
+
+/// Bounds on JSON texts from outside the process.
+struct JsonLimits {
+  std::size_t maxBytes = 16u * 1024u * 1024u;
+  std::size_t maxDepth = 200;
+};
+
+/// Parses a JSON text. Returns nothing for a text that is not JSON, is too large or too deep, holds
+/// invalid UTF-8, or a number that does not fit a double. Never throws. Work is linear in the text.
+/// Of duplicate keys in one object the last value wins, at the position of the first.
+[[nodiscard]] std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits = {}) noexcept;
+
+/// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
+[[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
+
+}  // namespace kyn::platform
