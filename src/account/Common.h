@@ -1,0 +1,104 @@
+#pragma once
+
+#include "platform/assistant/Model.h"
+#include "platform/notify/NotificationCenter.h"
+
+#include <mutex>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace kyn {
+
+/// The preferences domain of the plug-in.
+inline constexpr std::string_view PreferencesBundleID = "com.zanto.tessel.kyn.assistant";
+/// The key under which the host of the last server redirect is kept.
+inline constexpr std::string_view RedirectedHostKey = "RedirectedHostKey";
+
+/// The account and device context: the signed-in account's identifiers, token and host, the host
+/// the server last redirected the plug-in to (kept across restarts), and the device facts of the
+/// client context. Account facts are in one of three states: not loaded (after creation or
+/// `clearKYNAccount`), loaded without an account (retried on each read) and loaded.
+///
+/// Thread-safe: the host's thread reads the account while the network thread delivers redirects.
+class Common {
+ public:
+  /// The process-wide instance, created (and its account loaded) on first use.
+  static Common& sharedInstance();
+
+  /// Registers for the redirect notification on the default centre.
+  Common();
+  /// Unregisters from the default centre.
+  ~Common();
+  Common(const Common&) = delete;
+  Common& operator=(const Common&) = delete;
+
+  /// Reads the account facts from the system-information service.
+  void loadAccountInfo();
+  /// Handler of the redirect notification: stores the redirected host of a redirected command.
+  void redirected(const platform::Notification& notification);
+
+  // Account facts; each loads them first when they are not loaded.
+  [[nodiscard]] std::optional<std::string> username();
+  [[nodiscard]] std::optional<std::string> personID();
+  /// The application token. A secret: never logged.
+  [[nodiscard]] std::optional<std::string> appToken();
+  [[nodiscard]] bool tokenIsNotAccessible();
+  [[nodiscard]] bool hasKYNUser();
+  /// Forgets every account fact; the next read loads them afresh.
+  void clearKYNAccount();
+
+  /// The account's service host as stored, without loading.
+  [[nodiscard]] std::optional<std::string> kynHost() const;
+  void setKynHost(std::optional<std::string> host);
+
+  [[nodiscard]] bool accountInfoLoaded() const;
+  void setAccountInfoLoaded(bool loaded);
+  [[nodiscard]] bool isRenewingAccountCredentials() const;
+  void setIsRenewingAccountCredentials(bool renewing);
+  [[nodiscard]] bool isTokenAccessible() const;
+  void setIsTokenAccessible(bool accessible);
+  [[nodiscard]] bool isAccountPresent() const;
+  void setIsAccountPresent(bool present);
+
+  /// The host of the last redirect, read from the preferences store on each call.
+  [[nodiscard]] std::optional<std::string> redirectedHost() const;
+  /// Forgets the redirected host.
+  void flushRedirection();
+
+  [[nodiscard]] std::optional<std::string> deviceUDID() const;
+  [[nodiscard]] std::optional<std::string> productType() const;
+  [[nodiscard]] std::optional<std::string> buildVersion() const;
+  /// The OS version cut to two components, cached once known.
+  [[nodiscard]] std::optional<std::string> osVersion();
+  /// Use of the service is restricted for this user.
+  [[nodiscard]] bool isAppRestricted() const;
+  /// Always true.
+  [[nodiscard]] bool isKYNAllowed() const noexcept { return true; }
+  /// True when the handle holds "@" anywhere: every other handle is a phone handle.
+  [[nodiscard]] bool isHandleEmail(std::string_view handle) const noexcept;
+
+
+ private:
+  void loadAccountInfoLocked();
+  void ensureLoadedLocked();
+
+  mutable std::mutex mutex_;
+  std::optional<std::string> username_;
+  std::optional<std::string> personID_;
+  std::optional<std::string> appToken_;
+  std::optional<std::string> kynHost_;
+  bool accountInfoLoaded_ = false;
+  bool isRenewingAccountCredentials_ = false;
+  bool isTokenAccessible_ = false;
+  bool isAccountPresent_ = false;
+  std::optional<std::string> osVersion_;
+
+  platform::NotificationCenter::Token observer_ = 0;
+};
+
+/// A dotted version cut to its first two components ("10.15.7" gives "10.15"; "11" stays "11").
+[[nodiscard]] std::string shortenedOSVersion(std::string_view version);
+
+}  // namespace kyn

@@ -1,0 +1,62 @@
+#include "commands/KYNBaseCmd.h"
+
+#include "account/Common.h"
+#include "platform/Services.h"
+
+namespace kyn {
+
+KYNBaseCmd::KYNBaseCmd() {
+  Common& common = Common::sharedInstance();
+  setScheme("https");
+  setUsername(common.personID());
+  setPassword(common.appToken());
+  setHost(common.redirectedHost());
+  if (!host()) setHost(common.kynHost());
+}
+
+Value KYNBaseCmd::headers() const {
+  Value headers = KYJSONCommand::headers();
+  headers["X-Zanto-Vorn-API-Ver"] = "4.0";
+  headers["X-Zanto-AuthScheme"] = "Forever";
+  return headers;
+}
+
+Value KYNBaseCmd::jsonBodyDictionary() const {
+  Value body = KYJSONCommand::jsonBodyDictionary();
+  body["clientContext"] = staticClientContext();
+  return body;
+}
+
+const Value* KYNBaseCmd::jsonResponseDictionary() {
+  const Value* response = KYJSONCommand::jsonResponseDictionary();
+  const Value* code = platform::memberNotNull(response, "statusCode");
+  statusCode_ = code ? std::optional<Value>(*code) : std::nullopt;
+  return response;
+}
+
+double KYNBaseCmd::minCallbackInterval() {
+  const Value* context = platform::member(jsonResponseDictionary(), "serverContext");
+  const auto ms = platform::numberValue(platform::member(context, "minCallbackIntervalInMS"));
+  return ms ? *ms / 1000.0 : 0.0;
+}
+
+Value KYNBaseCmd::makeClientContext() {
+  Common& common = Common::sharedInstance();
+  Value context = Value::object();
+  auto add = [&](const char* key, const std::optional<std::string>& value) {
+    if (value) context[key] = *value;
+  };
+  add("deviceUDID", common.deviceUDID());
+  add("productType", common.productType());
+  add("osVersion", common.osVersion());
+  add("buildVersion", common.buildVersion());
+  add("locale", platform::services().assistantPreferences.get()->languageCode());
+  return context;
+}
+
+const Value& KYNBaseCmd::staticClientContext() {
+  static const Value context = makeClientContext();
+  return context;
+}
+
+}  // namespace kyn

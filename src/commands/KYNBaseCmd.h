@@ -1,0 +1,52 @@
+#pragma once
+
+#include "platform/net/JsonCommand.h"
+
+#include <optional>
+#include <string>
+#include <string_view>
+
+namespace kyn {
+
+/// Prefix of every command path of the service.
+inline constexpr std::string_view KYNUrlBase = "/kytrservice/friends/va/";
+
+/// Base of every request to the location-sharing server: scheme, host and credentials from the
+/// account context, the two fixed headers, "clientContext" in every body, and the "statusCode" of
+/// every response.
+class KYNBaseCmd : public platform::KYJSONCommand {
+ public:
+  /// Takes the scheme, credentials and host (the redirected host when one is stored, else the
+  /// account's) from the account context. A command is built even without an account.
+  KYNBaseCmd();
+
+  /// The base headers plus "X-Zanto-Vorn-API-Ver" = "4.0" and "X-Zanto-AuthScheme" = "Forever".
+  [[nodiscard]] Value headers() const override;
+  /// The base body plus "clientContext".
+  [[nodiscard]] Value jsonBodyDictionary() const override;
+  /// The parsed response, unchanged; sets `statusCode` from it (nothing when absent or null).
+  [[nodiscard]] const Value* jsonResponseDictionary() override;
+  /// "minCallbackIntervalInMS" of the response's "serverContext", in seconds; 0 when absent.
+  [[nodiscard]] double minCallbackInterval() override;
+
+  /// The client context shared by every command of the process: built on first use, never rebuilt.
+  [[nodiscard]] static const Value& staticClientContext();
+  /// A client context built now: "deviceUDID", "productType", "osVersion", "buildVersion", "locale",
+  /// each only when known.
+  [[nodiscard]] static Value makeClientContext();
+
+  /// "statusCode" of the last parsed response, as it came (a number or a numeric string).
+  [[nodiscard]] const std::optional<Value>& statusCode() const noexcept { return statusCode_; }
+  void setStatusCode(std::optional<Value> code) { statusCode_ = std::move(code); }
+  /// The server context of the last response as a context identifier URL.
+  [[nodiscard]] const std::optional<std::string>& contextIdentifierURL() const noexcept { return contextIdentifierURL_; }
+  void setContextIdentifierURL(std::optional<std::string> url) { contextIdentifierURL_ = std::move(url); }
+
+  [[nodiscard]] std::string_view commandName() const override { return "KYNBaseCmd"; }
+
+ private:
+  std::optional<Value> statusCode_;
+  std::optional<std::string> contextIdentifierURL_;
+};
+
+}  // namespace kyn
