@@ -1,0 +1,122 @@
+#include "platform/value/Json.h"
+#include "support/Fakes.h"
+
+#include <gtest/gtest.h>
+
+#include <fstream>
+#include <sstream>
+
+namespace kyn::platform {
+namespace {
+
+TEST(Json, ParsesDocumentsKeepingKeyOrder) {
+  auto v = parseJson(R"({"z":1,"a":[true,null,"x"],"m":{"k":2.5}})");
+  ASSERT_TRUE(v);
+  std::vector<std::string> keys;
+  for (const auto& [k, _] : v->items()) keys.push_back(k);
+  EXPECT_EQ(keys, (std::vector<std::string>{"z", "a", "m"}));
+  EXPECT_TRUE((*v)["a"][1].is_null());
+  EXPECT_EQ((*v)["m"]["k"].get<double>(), 2.5);
+}
+
+TEST(Json, DuplicateKeysKeepTheLastValueAtTheFirstPosition) {
+  // Small objects search linearly, large ones through an index: both must agree.
+  for (int members : {3, 40}) {
+    std::string text = "{";
+    for (int i = 0; i < members; ++i) text += "\"k" + std::to_string(i) + "\":" + std::to_string(i) + ",";
+    text += "\"k1\":\"again\"}";
+    auto v = parseJson(text);
+    ASSERT_TRUE(v) << members;
+    EXPECT_EQ(v->size(), static_cast<std::size_t>(members));
+    EXPECT_EQ((*v)["k1"], "again");
+    EXPECT_EQ(std::next(v->begin()).key(), "k1");
+  }
+}
+
+TEST(Json, RejectsWhatIsNotOneValidDocument) {
+  for (const char* bad : {"", "{", "[1,]", "{\"a\":1}x", "tru", "\"\\uD800\"", "1e999", "-1e400", "\"a\tb\""}) {
+    EXPECT_FALSE(parseJson(bad)) << bad;
+  }
+  EXPECT_FALSE(parseJson(std::string("\"\xC3\x28\"")));  // invalid UTF-8
+  EXPECT_FALSE(parseJson(std::string("\"\xED\xA0\x80\"")));  // an encoded surrogate
+}
+
+TEST(Json, BoundsDepthAndSize) {
+  JsonLimits limits;
+  limits.maxDepth = 10;
+  EXPECT_TRUE(parseJson(std::string(10, '[') + std::string(10, ']'), limits));
+  EXPECT_FALSE(parseJson(std::string(11, '[') + std::string(11, ']'), limits));
+  // Far beyond the default depth: rejected without exhausting the stack.
+  EXPECT_FALSE(parseJson(std::string(100000, '[') + std::string(100000, ']')));
+  limits.maxBytes = 8;
+  EXPECT_TRUE(parseJson("[1,2,3]", limits));
+  EXPECT_FALSE(parseJson("[1,2,3,4]", limits));
+}
+
+TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
+  Value v = Value::object();
+  v["name"] = std::string("bad \xFF byte");
+  const std::string text = toJson(v);
+  EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
+  EXPECT_TRUE(parseJson(text));
+}
+
+TEST(Json, ValueReaders) {
+  auto v = *parseJson(R"({"s":"12abc","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"u":18446744073709551615})");
+  EXPECT_EQ(integerValue(member(v, "s")), 12);
+  EXPECT_EQ(integerValue(member(v, "n")), 7);
+  EXPECT_EQ(integerValue(member(v, "neg")), -3);
+  EXPECT_EQ(integerValue(member(v, "b")), 1);
+  EXPECT_EQ(integerValue(member(v, "null")), 0);
+  EXPECT_EQ(integerValue(member(v, "missing")), 0);
+  EXPECT_EQ(integerValue(member(v, "big")), INT64_MAX);
+  EXPECT_EQ(integerValue(member(v, "u")), INT64_MAX);
+  EXPECT_EQ(member(v, "null")->is_null(), true);
+  EXPECT_EQ(memberNotNull(&v, "null"), nullptr);
+  EXPECT_FALSE(numberValue(member(v, "b")));
+  EXPECT_FALSE(stringValue(member(v, "n")));
+  EXPECT_EQ(member(nullptr, "s"), nullptr);
+  Value array = Value::array();
+  EXPECT_EQ(member(array, "s"), nullptr);
+}
+
+// The JSONTestSuite corpus: y_ must parse, n_ must be rejected, i_ may go either way but must not
+// crash or hang.
+TEST(Json, OutsideCorpus) {
+  auto dir = test::sharedTestData("json-parsing");
+  if (!dir) GTEST_SKIP() << "../shared/testdata/json-parsing is not beside the project";
+  int files = 0;
+  for (const auto& entry : std::filesystem::directory_iterator(*dir)) {
+    const std::string name = entry.path().filename().string();
+    if (entry.path().extension() != ".json") continue;
+    std::ifstream in(entry.path(), std::ios::binary);
+    std::stringstream buffer;
+    buffer << in.rdbuf();
+    const auto parsed = parseJson(buffer.str());
+    ++files;
+    if (name.starts_with("y_")) {
+      EXPECT_TRUE(parsed) << name;
+    }
+    if (name.starts_with("n_")) {
+      EXPECT_FALSE(parsed) << name;
+    }
+    if (parsed) {
+      EXPECT_TRUE(parseJson(toJson(*parsed))) << name << " does not survive a round trip";
+    }
+  }
+  EXPECT_GE(files, 300);
+}
+
+}  // namespace
+}  // namespace kyn::platform
+
+namespace kyn::platform {
+namespace {
+
+TEST(Json, ANulByteEndsNothing) {
+  EXPECT_FALSE(parseJson(std::string("[1]\0garbage", 11)));
+  EXPECT_FALSE(parseJson(std::string("\"a\0b\"", 5)));
+}
+
+}  // namespace
+}  // namespace kyn::platform

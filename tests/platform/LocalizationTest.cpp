@@ -1,0 +1,76 @@
+#include "platform/localization/Localization.h"
+#include "platform/log/Format.h"
+
+#include <gtest/gtest.h>
+
+namespace kyn::platform {
+namespace {
+
+const char* const kKeys[] = {
+    "LOCATED_NOW", "ACCESSIBILITY_LOCATED_NOW", "LOCATED_LESS_THAN_30SECONDS",
+    "ACCESSIBILITY_LOCATED_LESS_THAN_30SECONDS", "LOCATED_MINUTES", "ACCESSIBILITY_LOCATED_MINUTE",
+    "ACCESSIBILITY_LOCATED_MINUTES", "LOCATED_LESS_THAN_1HR", "ACCESSIBILITY_LOCATED_LESS_THAN_1HR",
+    "LOCATED_MORE_THAN_1HR", "ACCESSIBILITY_LOCATED_MORE_THAN_1HR", "CITY_STATE_LABEL", "LOCATING",
+    "NO_LOCATION", "DATE_YESTERDAY", "HIDDEN_LOCATION"};
+
+TEST(Localization, EveryLanguageHasEveryKeyWithItsPlaceholders) {
+  IcuLocalization strings;
+  for (const char* language : {"en", "de", "fr"}) {
+    for (std::string_view key : kKeys) {
+      const std::string text = strings.localizedString(key, language);
+      EXPECT_NE(text, key) << language << " " << key;
+      const bool isNow = key == "LOCATED_NOW" || key == "ACCESSIBILITY_LOCATED_NOW";
+      const bool isAge = key.find("LOCATED") != std::string_view::npos;
+      if (isAge) {
+        EXPECT_EQ(text.find("%@") != std::string::npos, !isNow) << language << " " << key << ": " << text;
+      }
+    }
+    // City first, state second, whatever the language.
+    EXPECT_EQ(format(strings.localizedString("CITY_STATE_LABEL", language), "Cupertino", "CA"), "Cupertino, CA");
+  }
+}
+
+TEST(Localization, LanguagesFallBackToTheirParentsThenToEnglish) {
+  IcuLocalization strings;
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "en-US"), "Yesterday");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de"), "Gestern");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de-CH"), "Gestern");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de_AT"), "Gestern");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "fr-CA"), "Hier");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "ja-JP"), "Yesterday");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", ""), "Yesterday");
+  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "!!not a tag"), "Yesterday");
+}
+
+TEST(Localization, AMissingKeyComesBackAsTheKey) {
+  IcuLocalization strings;
+  EXPECT_EQ(strings.localizedString("NO_SUCH_KEY", "de"), "NO_SUCH_KEY");
+  EXPECT_EQ(strings.localizedString("", "en"), "");
+}
+
+TEST(NumberFormatting, IntegersArePlainInTheLocale) {
+  EXPECT_EQ(IcuNumberFormatting("en_US").integerText(12345), "12345");
+  EXPECT_EQ(IcuNumberFormatting("de_DE").integerText(12345), "12345");
+  EXPECT_EQ(IcuNumberFormatting("ar_EG").integerText(42), "\u0664\u0662");  // Arabic-Indic digits
+}
+
+TEST(NumberFormatting, DecimalsAreReadAsTheLocaleWritesThem) {
+  IcuNumberFormatting en("en_US");
+  IcuNumberFormatting de("de_DE");
+  EXPECT_EQ(en.parseDecimal("1234.5"), 1234.5);
+  EXPECT_EQ(en.parseDecimal("1,234.5"), 1234.5);
+  EXPECT_EQ(de.parseDecimal("1234,5"), 1234.5);
+  EXPECT_EQ(de.parseDecimal("1.234,5"), 1234.5);
+  EXPECT_EQ(en.parseDecimal("-12"), -12.0);
+  for (const char* bad : {"", "abc", "12abc", "1 2"}) EXPECT_FALSE(en.parseDecimal(bad)) << bad;
+}
+
+TEST(LanguageTags, BecomeIcuLocaleIds) {
+  EXPECT_EQ(icuLocaleId("en-US"), "en_US");
+  EXPECT_EQ(icuLocaleId("de_CH"), "de_CH");
+  EXPECT_EQ(icuLocaleId("zh-Hant-TW"), "zh_Hant_TW");
+  EXPECT_EQ(icuLocaleId(""), "root");
+}
+
+}  // namespace
+}  // namespace kyn::platform

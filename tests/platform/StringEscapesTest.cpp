@@ -1,0 +1,86 @@
+#include "platform/text/StringEscapes.h"
+
+#include <gtest/gtest.h>
+
+#include <random>
+
+namespace kyn::platform {
+namespace {
+
+TEST(PercentEscape, EscapesQuerySyntaxAndKeepsUnreserved) {
+  EXPECT_EQ(encodeToPercentEscape("a&b=c%d"), "a%26b%3Dc%25d");
+  EXPECT_EQ(encodeToPercentEscape("AZaz09-._~"), "AZaz09-._~");
+  EXPECT_EQ(encodeToPercentEscape("a b+c/d?#"), "a%20b%2Bc%2Fd%3F%23");
+  EXPECT_EQ(encodeToPercentEscape("é"), "%C3%A9");
+}
+
+TEST(PercentEscape, DecodeIsTheExactInverse) {
+  std::mt19937 rng(7);
+  for (int round = 0; round < 2000; ++round) {
+    // Random valid UTF-8: ASCII including the query's own syntax, plus some multi-byte characters.
+    std::string text;
+    const int n = static_cast<int>(rng() % 24);
+    for (int i = 0; i < n; ++i) {
+      switch (rng() % 4) {
+        case 0: text += "é"; break;
+        case 1: text += "漢"; break;
+        default: text += static_cast<char>(32 + rng() % 95); break;
+      }
+    }
+    const std::string escaped = encodeToPercentEscape(text);
+    EXPECT_EQ(escaped.find_first_of("&= +"), std::string::npos) << escaped;
+    EXPECT_EQ(decodeFromPercentEscape(escaped), text);
+  }
+}
+
+TEST(PercentEscape, BrokenEscapesDecodeToNothing) {
+  for (const char* bad : {"%", "%4", "abc%", "%zz", "%G1", "%C3"}) {
+    EXPECT_FALSE(decodeFromPercentEscape(bad)) << bad;
+  }
+  EXPECT_EQ(decodeFromPercentEscape("%41%62c"), "Abc");
+  EXPECT_EQ(decodeFromPercentEscape("%c3%a9"), "é");  // lower-case hex is accepted
+}
+
+TEST(Numeric, WholeTextMustBeOneNumber) {
+  for (const char* yes : {"0", "42", "-7", "+7", "3.5", ".5", "5.", "1e9", "2E-3", "0010"}) {
+    EXPECT_TRUE(isNumeric(yes)) << yes;
+  }
+  for (const char* no : {"", "-", ".", "e5", "1e", "1e+", " 1", "1 ", "1,5", "0x10", "٣", "1.2.3", "abc"}) {
+    EXPECT_FALSE(isNumeric(no)) << no;
+  }
+}
+
+TEST(Numeric, LeadingIntegerSaturates) {
+  EXPECT_EQ(leadingInteger32("9999999999"), 2147483647);
+  EXPECT_EQ(leadingInteger32("-9999999999"), -2147483648);
+  EXPECT_EQ(leadingInteger32("2147483647"), 2147483647);
+  EXPECT_EQ(leadingInteger32("-2147483648"), -2147483648);
+  EXPECT_EQ(leadingInteger32("3.99"), 3);
+  EXPECT_EQ(leadingInteger32("  -12abc"), -12);
+  EXPECT_EQ(leadingInteger32("1e5"), 1);
+  EXPECT_EQ(leadingInteger32("abc"), 0);
+  EXPECT_EQ(leadingInteger64("-9223372036854775808"), INT64_MIN);
+  EXPECT_EQ(leadingInteger64("99999999999999999999"), INT64_MAX);
+}
+
+TEST(Numeric, DescriptionsReadBackAsTheSameNumber) {
+  EXPECT_EQ(numberDescription(42.0), "42");
+  EXPECT_EQ(numberDescription(-0.0), "0");
+  EXPECT_EQ(numberDescription(3.5), "3.5");
+  EXPECT_EQ(numberDescription(0.1), "0.1");
+  EXPECT_EQ(numberDescription(1e20), "1e+20");
+  for (double d : {1.0 / 3.0, 123456.789, -2.2250738585072014e-308}) {
+    EXPECT_EQ(std::stod(numberDescription(d)), d);
+  }
+}
+
+TEST(Utf8, Validation) {
+  EXPECT_TRUE(isValidUtf8("plain é 漢 😀"));
+  EXPECT_FALSE(isValidUtf8("\xC0\xAF"));      // overlong
+  EXPECT_FALSE(isValidUtf8("\xED\xA0\x80"));  // surrogate
+  EXPECT_FALSE(isValidUtf8("\xF4\x90\x80\x80"));  // beyond U+10FFFF
+  EXPECT_FALSE(isValidUtf8("\xE6\xBC"));      // truncated
+}
+
+}  // namespace
+}  // namespace kyn::platform

@@ -1,0 +1,50 @@
+#include "support/Fakes.h"
+
+#include <sys/stat.h>
+
+#include <chrono>
+#include <cstdlib>
+#include <fstream>
+#include <stdexcept>
+
+namespace kyn::test {
+
+TempDir::TempDir() {
+  std::string templ = (std::filesystem::temp_directory_path() / "kyn-test-XXXXXX").string();
+  if (::mkdtemp(templ.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
+  path_ = templ;
+}
+
+TempDir::~TempDir() {
+  std::error_code ec;
+  std::filesystem::remove_all(path_, ec);
+}
+
+std::filesystem::path TempDir::write(const std::string& name, std::string_view text, unsigned mode) const {
+  const auto file = path_ / name;
+  std::filesystem::create_directories(file.parent_path());
+  {
+    std::ofstream out(file, std::ios::binary | std::ios::trunc);
+    out.write(text.data(), static_cast<std::streamsize>(text.size()));
+  }
+  ::chmod(file.c_str(), mode);
+  return file;
+}
+
+platform::Date utcDate(int year, int month, int day, int hour, int minute, double second) {
+  using namespace std::chrono;
+  const sys_days days = year_month_day{std::chrono::year{year}, std::chrono::month{static_cast<unsigned>(month)},
+                                       std::chrono::day{static_cast<unsigned>(day)}};
+  const double since1970 = static_cast<double>(days.time_since_epoch().count()) * 86400.0 + hour * 3600.0 +
+                           minute * 60.0 + second;
+  return since1970 - platform::kReferenceDateSince1970;
+}
+
+std::optional<std::filesystem::path> sharedTestData(std::string_view subfolder) {
+  std::filesystem::path dir = std::filesystem::path(KYN_SHARED_TESTDATA) / subfolder;
+  std::error_code ec;
+  if (!std::filesystem::is_directory(dir, ec)) return std::nullopt;
+  return dir;
+}
+
+}  // namespace kyn::test

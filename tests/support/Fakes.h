@@ -1,0 +1,93 @@
+#pragma once
+
+// Fakes of the platform services, installed through the services registry.
+
+#include "platform/Services.h"
+
+#include <atomic>
+#include <filesystem>
+#include <map>
+#include <mutex>
+#include <optional>
+#include <string>
+
+namespace kyn::test {
+
+/// Account and device facts set by the test; counts how often the account was asked for.
+class FakeSystemInfo final : public platform::SystemInfo {
+ public:
+  std::optional<platform::OwnerAccount> ownerAccount() override {
+    std::lock_guard lock(mutex);
+    ++accountReads;
+    return account;
+  }
+  std::optional<std::string> deviceUDID() override { return udid; }
+  std::optional<std::string> productType() override { return product; }
+  std::optional<std::string> osVersion() override {
+    ++osVersionReads;
+    return os;
+  }
+  std::optional<std::string> osBuildVersion() override { return build; }
+
+  void signIn(std::string personId = "P-1001", std::optional<std::string> token = "secret-token-42",
+              std::optional<std::string> host = "kyn.example.test", std::string username = "ada@example.test") {
+    std::lock_guard lock(mutex);
+    account = platform::OwnerAccount(std::move(personId), std::move(username), std::move(token), std::move(host));
+  }
+  void signOut() {
+    std::lock_guard lock(mutex);
+    account.reset();
+  }
+
+  std::mutex mutex;
+  std::optional<platform::OwnerAccount> account;
+  int accountReads = 0;
+  std::optional<std::string> udid = "0F8A2C4E-1B3D-4F5A-9C7E-2D4B6F8A0C1E";
+  std::optional<std::string> product = "Test Desktop 1";
+  std::optional<std::string> os = "12.4.1";
+  std::optional<std::string> build = "6.1.0-test";
+  std::atomic<int> osVersionReads{0};
+};
+
+class FakeSession final : public platform::ServiceSession {
+ public:
+  bool isProvisionedForLocationSharing() override { return provisioned; }
+  bool isRestricted() override { return restricted; }
+  std::atomic<bool> provisioned{true};
+  std::atomic<bool> restricted{false};
+};
+
+/// A clock that stands still unless the test moves it.
+class FixedClock final : public platform::Clock {
+ public:
+  explicit FixedClock(platform::Date now = 0.0) : now_(now) {}
+  platform::Date now() const override { return now_.load(); }
+  void set(platform::Date now) { now_.store(now); }
+  void advance(double seconds) { now_.store(now_.load() + seconds); }
+
+ private:
+  std::atomic<platform::Date> now_;
+};
+
+/// A temporary directory, removed with everything in it at the end of the scope.
+class TempDir {
+ public:
+  TempDir();
+  ~TempDir();
+  TempDir(const TempDir&) = delete;
+  TempDir& operator=(const TempDir&) = delete;
+  [[nodiscard]] const std::filesystem::path& path() const noexcept { return path_; }
+  /// Writes `text` to `name` inside the directory (with the given mode) and returns its path.
+  std::filesystem::path write(const std::string& name, std::string_view text, unsigned mode = 0600) const;
+
+ private:
+  std::filesystem::path path_;
+};
+
+/// Seconds since 2001 for a UTC calendar date and time.
+[[nodiscard]] platform::Date utcDate(int year, int month, int day, int hour = 0, int minute = 0, double second = 0);
+
+/// Folder of the outside test data, or nothing when it is not beside the project.
+[[nodiscard]] std::optional<std::filesystem::path> sharedTestData(std::string_view subfolder);
+
+}  // namespace kyn::test

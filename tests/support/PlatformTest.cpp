@@ -1,0 +1,41 @@
+#include "support/PlatformTest.h"
+
+#include "account/Common.h"
+
+namespace kyn::test {
+
+void PlatformTest::SetUp() {
+  configDir = std::make_unique<TempDir>();
+  auto& s = platform::services();
+  s.configure(configDir->path());
+
+  log = std::make_shared<platform::CaptureLogSink>();
+  previousSink_ = s.log().setSink(log);
+  previousLevel_ = s.log().minimumLevel();
+  s.log().setMinimumLevel(platform::LogLevel::Debug);
+
+  systemInfo = std::make_shared<FakeSystemInfo>();
+  session = std::make_shared<FakeSession>();
+  clock = std::make_shared<FixedClock>(utcDate(2026, 11, 21, 15, 30, 0));
+  assistant = std::make_shared<platform::AssistantPreferences>("en-US");
+  s.systemInfo.set(systemInfo);
+  s.session.set(session);
+  s.clock.set(clock);
+  s.calendar.set(std::make_shared<platform::IcuCalendar>("UTC"));
+  s.numberFormatting.set(std::make_shared<platform::IcuNumberFormatting>("en_US"));
+  s.assistantPreferences.set(assistant);
+
+  Common::sharedInstance().clearKYNAccount();
+  systemInfo->accountReads = 0;  // creating the shared instance read the account once
+}
+
+void PlatformTest::TearDown() {
+  auto& s = platform::services();
+  Common::sharedInstance().clearKYNAccount();
+  s.log().setSink(previousSink_);
+  s.log().setMinimumLevel(previousLevel_);
+  s.configure(configDir->path());  // drops every fake
+  configDir.reset();
+}
+
+}  // namespace kyn::test

@@ -1,0 +1,103 @@
+#include "support/PlatformTest.h"
+#include "platform/value/Json.h"
+#include "utils/KYNAXUtils.h"
+
+#include <cmath>
+
+namespace kyn {
+namespace {
+
+class LocationConversionTest : public test::PlatformTest {
+ protected:
+  static std::shared_ptr<AXLocation> ax(std::optional<double> lat, std::optional<double> lon,
+                                        std::optional<double> accuracy = std::nullopt) {
+    auto l = std::make_shared<AXLocation>();
+    l->latitude = lat;
+    l->longitude = lon;
+    l->accuracy = accuracy;
+    return l;
+  }
+  static platform::Location at(double lat, double lon, double accuracy = 10.0,
+                               std::optional<platform::Date> timestamp = std::nullopt) {
+    platform::Location l;
+    l.coordinate = {lat, lon};
+    l.horizontalAccuracy = accuracy;
+    l.timestamp = timestamp;
+    return l;
+  }
+};
+
+TEST_F(LocationConversionTest, ZeroOrMissingCoordinatesAreNoLocation) {
+  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(nullptr));
+  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(0.0, 20.0)));
+  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, 0.0)));
+  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(std::nullopt, 20.0)));
+  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, std::nullopt)));
+}
+
+TEST_F(LocationConversionTest, AnAssistantLocationBecomesAFixStampedNow) {
+  auto l = KYNAXUtils::coreLocationForAXLocation(ax(10.0, 20.0));
+  ASSERT_TRUE(l);
+  EXPECT_EQ(l->coordinate.latitude, 10.0);
+  EXPECT_EQ(l->coordinate.longitude, 20.0);
+  EXPECT_EQ(l->horizontalAccuracy, 0.0);
+  EXPECT_EQ(l->altitude, 0.0);
+  EXPECT_EQ(l->speed, 0.0);
+  EXPECT_EQ(l->timestamp, clock->now());
+  EXPECT_EQ(KYNAXUtils::coreLocationForAXLocation(ax(10.0, 20.0, 65.0))->horizontalAccuracy, 65.0);
+}
+
+TEST_F(LocationConversionTest, ThereIsNoRangeCheckUntilTheDictionary) {
+  auto l = KYNAXUtils::coreLocationForAXLocation(ax(std::nan(""), 20.0));
+  ASSERT_TRUE(l);
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(l));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(KYNAXUtils::coreLocationForAXLocation(ax(91.0, 20.0))));
+}
+
+TEST_F(LocationConversionTest, TheDictionaryHoldsCoordinateAndSourceInOrder) {
+  const auto d = KYNAXUtils::dictionaryForLocation(at(48.8566, 2.3522, 65.0, 0.5));
+  ASSERT_TRUE(d);
+  EXPECT_EQ(platform::toJson(*d),
+            R"({"latitude":48.8566,"longitude":2.3522,"source":"assistant","horizontalAccuracy":65.0,)"
+            R"("timestamp":978307200500.0})");
+}
+
+TEST_F(LocationConversionTest, OnlyTheLowEightBitsOfTheWholeMetresDecideTheAccuracy) {
+  struct Case {
+    double accuracy;
+    bool sent;
+  };
+  for (const Case c : {Case{65.0, true}, Case{0.4, false}, Case{0.0, false}, Case{1.0, true}, Case{255.9, true},
+                       Case{256.0, false}, Case{256.9, false}, Case{512.3, false}, Case{257.5, true},
+                       Case{-1.0, true}, Case{-256.0, false}, Case{std::nan(""), false}, Case{INFINITY, false},
+                       Case{1e12, false}}) {
+    const auto d = KYNAXUtils::dictionaryForLocation(at(10, 20, c.accuracy));
+    ASSERT_TRUE(d);
+    EXPECT_EQ(d->contains("horizontalAccuracy"), c.sent) << c.accuracy;
+    if (c.sent) {
+      EXPECT_EQ((*d)["horizontalAccuracy"].get<double>(), c.accuracy);
+    }
+  }
+}
+
+TEST_F(LocationConversionTest, TimestampsAreMillisecondsSince1970) {
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, 0.0))->contains("timestamp"));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, std::nullopt))->contains("timestamp"));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, std::nan("")))->contains("timestamp"));
+  const auto d = KYNAXUtils::dictionaryForLocation(at(10, 20, 10, 1.5 - platform::kReferenceDateSince1970));
+  EXPECT_EQ((*d)["timestamp"].get<double>(), 1'500.0);
+}
+
+TEST_F(LocationConversionTest, CoordinateValidity) {
+  for (auto [lat, lon] : {std::pair{90.0, 180.0}, {-90.0, -180.0}, {0.0, 0.0}}) {
+    EXPECT_TRUE(KYNAXUtils::dictionaryForLocation(at(lat, lon))) << lat << "," << lon;
+  }
+  for (auto [lat, lon] : {std::pair{91.0, 0.0}, {0.0, 180.5}, {-90.1, 0.0}, {INFINITY, 0.0}, {0.0, std::nan("")}}) {
+    EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(lat, lon))) << lat << "," << lon;
+  }
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(std::shared_ptr<const platform::Location>()));
+  EXPECT_TRUE(KYNAXUtils::isKYNAppInstalled());
+}
+
+}  // namespace
+}  // namespace kyn
