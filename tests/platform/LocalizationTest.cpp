@@ -26,7 +26,7 @@ TEST(Localization, EveryLanguageHasEveryKeyWithItsPlaceholders) {
       }
     }
     // City first, state second, whatever the language.
-    EXPECT_EQ(format(strings.localizedString("CITY_STATE_LABEL", language), "Cupertino", "CA"), "Cupertino, CA");
+    EXPECT_EQ(format(strings.localizedString("CITY_STATE_LABEL", language), "Portland", "OR"), "Portland, OR");
   }
 }
 
