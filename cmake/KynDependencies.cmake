@@ -10,3 +10,17 @@ pkg_check_modules(SYSTEMD REQUIRED IMPORTED_TARGET libsystemd)
 find_program(KYN_GENRB genrb REQUIRED)
 find_program(KYN_PKGDATA pkgdata REQUIRED)
 find_program(KYN_GENCCODE genccode REQUIRED)
+
+# libphonenumber ships neither a CMake package nor a pkg-config file.
+find_path(PHONENUMBER_INCLUDE_DIR phonenumbers/phonenumberutil.h REQUIRED)
+find_library(PHONENUMBER_LIBRARY phonenumber REQUIRED)
+add_library(kyn_phonenumber INTERFACE)
+target_include_directories(kyn_phonenumber SYSTEM INTERFACE ${PHONENUMBER_INCLUDE_DIR})
+target_link_libraries(kyn_phonenumber INTERFACE ${PHONENUMBER_LIBRARY})
+
+# stb_image, as Debian builds it into libstb.
+find_path(STB_INCLUDE_DIR stb/stb_image.h REQUIRED)
+find_library(STB_LIBRARY stb REQUIRED)
+add_library(kyn_stb INTERFACE)
+target_include_directories(kyn_stb SYSTEM INTERFACE ${STB_INCLUDE_DIR})
+target_link_libraries(kyn_stb INTERFACE ${STB_LIBRARY})

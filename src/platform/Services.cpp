@@ -37,7 +37,9 @@ Services::Services()
         auto language = configuration()->language();
         if (!language) language = systemLanguageTag();
         return std::make_shared<AssistantPreferences>(language);
-      }) {}
+      }),
+      locale([] { return std::make_shared<IcuLocaleInfo>(); }),
+      contactStore([]() -> std::shared_ptr<ContactStore> { return nullptr; }) {}
 
 std::shared_ptr<const Configuration> Services::configuration() {
   std::lock_guard lock(configMutex_);
@@ -65,6 +67,8 @@ void Services::resetSlots() {
   localization.set(nullptr);
   numberFormatting.set(nullptr);
   assistantPreferences.set(nullptr);
+  locale.set(nullptr);
+  contactStore.set(nullptr);
 }
 
 std::string avixUILocalizedStringForKey(std::string_view key) {

@@ -6,6 +6,8 @@
 #include "platform/assistant/AssistantPreferences.h"
 #include "platform/config/Configuration.h"
 #include "platform/core/NoDestructor.h"
+#include "platform/contacts/ContactStore.h"
+#include "platform/locale/LocaleInfo.h"
 #include "platform/localization/Localization.h"
 #include "platform/log/Log.h"
 #include "platform/notify/NotificationCenter.h"
@@ -63,6 +65,8 @@ class Services {
   ServiceSlot<Localization> localization;
   ServiceSlot<NumberFormatting> numberFormatting;
   ServiceSlot<AssistantPreferences> assistantPreferences;
+  ServiceSlot<LocaleInfo> locale;
+  ServiceSlot<ContactStore> contactStore;
 
   [[nodiscard]] Log& log() { return Log::shared(); }
   [[nodiscard]] NotificationCenter& notificationCenter() { return NotificationCenter::defaultCenter(); }

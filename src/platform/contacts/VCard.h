@@ -1,0 +1,22 @@
+#pragma once
+
+#include "platform/contacts/Contact.h"
+
+#include <string>
+#include <string_view>
+#include <vector>
+
+namespace kyn::platform {
+
+/// What one vCard text holds: its cards as contacts (one per card, not yet unified) and a line for
+/// every card that was skipped.
+struct VCardParseResult {
+  std::vector<Contact> contacts;
+  std::vector<std::string> skipped;
+};
+
+/// Reads every card of a vCard text (versions 2.1, 3.0 and 4.0 as real exporters write them).
+/// A card without UID gets the identifier `sourceName` + "#" + its position in the text.
+[[nodiscard]] VCardParseResult parseVCards(std::string_view text, std::string_view sourceName);
+
+}  // namespace kyn::platform

@@ -1,0 +1,29 @@
+#include "platform/image/Image.h"
+
+#include <stb/stb_image.h>
+
+#include <climits>
+
+namespace kyn::platform {
+
+std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) {
+  if (data.empty() || data.size() > static_cast<std::size_t>(INT_MAX)) return nullptr;
+  const auto* bytes = reinterpret_cast<const stbi_uc*>(data.data());
+  const int length = static_cast<int>(data.size());
+  int width = 0, height = 0, channels = 0;
+  // Ask for the size first, so that a forged header cannot make the decoder allocate gigabytes.
+  if (!stbi_info_from_memory(bytes, length, &width, &height, &channels)) return nullptr;
+  if (width <= 0 || height <= 0 || static_cast<long long>(width) * height > 100'000'000LL) return nullptr;
+  stbi_uc* pixels = stbi_load_from_memory(bytes, length, &width, &height, &channels, 0);
+  if (pixels == nullptr) return nullptr;
+  auto image = std::make_shared<Image>();
+  image->width = width;
+  image->height = height;
+  image->channels = channels;
+  image->pixels.assign(pixels, pixels + static_cast<std::size_t>(width) * static_cast<std::size_t>(height) *
+                                            static_cast<std::size_t>(channels));
+  stbi_image_free(pixels);
+  return image;
+}
+
+}  // namespace kyn::platform

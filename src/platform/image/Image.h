@@ -1,0 +1,22 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <span>
+#include <vector>
+
+namespace kyn::platform {
+
+/// A decoded picture: 8-bit channels, rows top to bottom.
+struct Image {
+  int width = 0;
+  int height = 0;
+  int channels = 0;  // 1 grey, 2 grey and alpha, 3 RGB, 4 RGBA
+  std::vector<std::uint8_t> pixels;
+};
+
+/// Decodes JPEG, PNG, GIF, BMP and the other formats of stb_image. Nothing for data that does not
+/// decode or a picture larger than 100 megapixels.
+[[nodiscard]] std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data);
+
+}  // namespace kyn::platform
