@@ -76,8 +76,18 @@ class Common {
   [[nodiscard]] bool isAppRestricted() const;
   /// Always true.
   [[nodiscard]] bool isKYNAllowed() const noexcept { return true; }
+  // ---- Handles ----
+
   /// True when the handle holds "@" anywhere: every other handle is a phone handle.
   [[nodiscard]] bool isHandleEmail(std::string_view handle) const noexcept;
+  /// The server handles of a person: its completed phone numbers (or, when it brought none, its
+  /// contact's), then its e-mail addresses as they stand. Duplicates are kept.
+  [[nodiscard]] std::vector<std::string> handlesForAXPerson(const AXPerson& person) const;
+  /// A raw phone number in canonical form: leading junk cut, then read in the default country;
+  /// the cut text when it is no phone number; nothing for nothing.
+  [[nodiscard]] std::optional<std::string> completeNumberForPhoneNumber(const std::optional<std::string>& raw) const;
+  /// The lower-case country code of the current locale, "us" when it has none; read on each call.
+  [[nodiscard]] static std::string defaultCountryCode();
 
 
  private:

@@ -1,0 +1,59 @@
+// The handle operations of the account context: an assistant person becomes the handles that the
+// server knows friends by, phone numbers in canonical form.
+#include "account/Common.h"
+#include "contacts/ContactsUtilities.h"
+#include "platform/Services.h"
+#include "platform/phone/PhoneNumbers.h"
+#include "platform/text/Unicode.h"
+
+namespace kyn {
+
+namespace {
+
+bool isPhoneCharacter(char32_t c) {
+  return platform::isDecimalDigit(c) || c == U'+' || c == U'(' || c == U')' || c == U'*' || c == U'#' || c == U'-';
+}
+
+}  // namespace
+
+std::string Common::defaultCountryCode() {
+  return platform::phoneRegionOfLocale(*platform::services().locale.get());
+}
+
+std::optional<std::string> Common::completeNumberForPhoneNumber(const std::optional<std::string>& raw) const {
+  if (!raw) return std::nullopt;
+  // Only leading junk ("Mobile: ", "ext. ") is cut; whatever follows the first phone character is
+  // left to the parser.
+  std::string kept = platform::suffixFromFirstMatch(*raw, isPhoneCharacter).value_or(*raw);
+  if (kept.empty()) return kept;
+  if (auto canonical = platform::formatPhoneNumber(kept, defaultCountryCode(), platform::PhoneNumberStyle::Canonical)) {
+    return canonical;
+  }
+  return kept;
+}
+
+std::vector<std::string> Common::handlesForAXPerson(const AXPerson& person) const {
+  std::vector<std::string> handles;
+  if (person.phones) {
+    for (const auto& phone : *person.phones) {
+      if (!phone) continue;
+      if (auto number = completeNumberForPhoneNumber(phone->number)) handles.push_back(std::move(*number));
+    }
+  }
+  // The contact's numbers stand in only when the person brought none of its own.
+  if (handles.empty()) {
+    const auto contact = ContactsUtilities::contactForAssistantId(person.identifier);
+    for (const auto& number : ContactsUtilities::phoneNumbersForContact(contact)) {
+      if (auto completed = completeNumberForPhoneNumber(number)) handles.push_back(std::move(*completed));
+    }
+  }
+  // E-mail addresses go as the person holds them; entries without an address are skipped.
+  if (person.emails) {
+    for (const auto& email : *person.emails) {
+      if (email && email->emailAddress) handles.push_back(*email->emailAddress);
+    }
+  }
+  return handles;
+}
+
+}  // namespace kyn

@@ -1,0 +1,208 @@
+#include "model/KYNAXLocation.h"
+
+#include "account/Common.h"
+#include "contacts/ContactsUtilities.h"
+#include "platform/Services.h"
+#include "platform/phone/PhoneNumbers.h"
+#include "platform/text/Unicode.h"
+#include "utils/KYNAXUtils.h"
+
+namespace kyn {
+
+using platform::member;
+using platform::memberNotNull;
+using platform::services;
+
+namespace {
+
+/// A member that must be a JSON object to be read; anything else (null included) is absent.
+const Value* objectMember(const Value* object, std::string_view key) {
+  const Value* v = member(object, key);
+  return (v != nullptr && v->is_object()) ? v : nullptr;
+}
+
+std::optional<double> number(const Value* object, std::string_view key) {
+  return platform::numberValue(member(object, key));
+}
+
+std::optional<std::string> text(const Value* object, std::string_view key) {
+  return platform::stringValue(member(object, key));
+}
+
+}  // namespace
+
+KYNAXLocation::KYNAXLocation(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
+                             const Value* entry) {
+  decodeHandle(handle, std::move(person), entry);
+}
+
+KYNAXLocation::KYNAXLocation(std::shared_ptr<AXKynLocation> location) : avixLocation(std::move(location)) {}
+
+std::shared_ptr<KYNAXLocation> KYNAXLocation::locationWithHandle(const std::optional<std::string>& handle,
+                                                                 std::shared_ptr<AXPerson> person, const Value* entry) {
+  return std::make_shared<KYNAXLocation>(handle, std::move(person), entry);
+}
+
+std::shared_ptr<KYNAXLocation> KYNAXLocation::locationWithAvixLocation(std::shared_ptr<AXKynLocation> location) {
+  return std::make_shared<KYNAXLocation>(std::move(location));
+}
+
+std::shared_ptr<platform::NumberFormatting> KYNAXLocation::numberFormatter() {
+  return services().numberFormatting.get();
+}
+
+std::shared_ptr<platform::Localization> KYNAXLocation::bundle() { return services().localization.get(); }
+
+void KYNAXLocation::decodeHandle(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
+                                 const Value* entry) {
+  auto location = std::make_shared<AXKynLocation>();
+  avixLocation = location;
+
+  if (!person) {
+    const bool isEmail = handle && Common::sharedInstance().isHandleEmail(*handle);
+    person = isEmail ? personForEmailFromContacts(handle) : personForPhoneFromContacts(handle);
+  }
+  services().log().notice("AXPerson found: %@", person);
+
+  auto attribute = std::make_shared<AXPersonAttribute>();
+  attribute->object = person;
+  attribute->data = handle;
+  location->friend_ = attribute;
+
+  if (const Value* distance = member(entry, "distanceInMeters")) {
+    // The server sends the distance as text; it is read as the user's locale writes numbers.
+    // A value that is no text reads as no distance.
+    location->distance = distance->is_string() ? numberFormatter()->parseDecimal(distance->get_ref<const std::string&>())
+                                               : std::nullopt;
+  }
+
+  const Value* fix = objectMember(entry, "location");
+  const Value* address = objectMember(fix, "address");
+  location->city = text(address, "locality");
+  // The administrative area stands in only when the state code is missing altogether; a state
+  // code that is present as null stays null.
+  location->stateCode = member(address, "stateCode") != nullptr ? text(address, "stateCode")
+                                                                 : text(address, "administrativeArea");
+  location->latitude = number(fix, "latitude");
+  location->longitude = number(fix, "longitude");
+  location->accuracy = number(fix, "horizontalAccuracy");
+  location->locationDate = KYNAXUtils::timeIntervalForMillisecondsSince1970(number(fix, "timestamp"));
+  location->street = text(fix, "streetAddress");
+
+  if (const Value* labels = memberNotNull(fix, "labels"); labels != nullptr && labels->is_array()) {
+    for (const Value& element : *labels) {
+      location->label = text(&element, "label");
+      if (location->label) break;  // the first label that is there wins
+    }
+  }
+}
+
+bool KYNAXLocation::hasCoordinate() const {
+  return avixLocation && avixLocation->latitude && avixLocation->longitude;
+}
+
+std::optional<std::string> KYNAXLocation::friendLocation(bool located) const {
+  if (avixLocation && avixLocation->label) return avixLocation->label;
+  std::optional<std::string> place;
+  if (avixLocation) {
+    const auto& state = avixLocation->stateCode;
+    const auto& city = avixLocation->city;
+    if (!state) {
+      place = city;
+    } else if (!city) {
+      place = state;
+    } else if (*city == *state) {
+      place = city;
+    } else {
+      place = platform::format(platform::avixUILocalizedStringForKey("CITY_STATE_LABEL"), *city, *state);
+    }
+  }
+  if (place) return place;
+  return platform::avixUILocalizedStringForKey(located ? "NO_LOCATION" : "LOCATING");
+}
+
+// ---- Identity ----
+
+std::shared_ptr<AXPerson> KYNAXLocation::personForEmailFromContacts(const std::optional<std::string>& email) const {
+  auto person = std::make_shared<AXPerson>();
+  auto entry = std::make_shared<AXEmail>();
+  entry->emailAddress = email;
+  person->emails = std::vector{entry};
+  if (auto contact = ContactsUtilities::contactForEmail(email)) {
+    person->firstName = contact->givenName;
+    person->lastName = contact->familyName;
+    person->fullName = platform::fullNameOfContact(*contact, services().locale.get()->localeId());
+    person->identifier = platform::assistantIdentifierForContactIdentifier(contact->identifier);
+  }
+  return person;
+}
+
+std::shared_ptr<AXPerson> KYNAXLocation::personForPhoneFromContacts(const std::optional<std::string>& phone) const {
+  auto person = std::make_shared<AXPerson>();
+  auto entry = std::make_shared<AXPhone>();
+  entry->number = phone;
+  person->phones = std::vector{entry};
+  if (auto contact = ContactsUtilities::contactForPhone(phone)) {
+    person->firstName = contact->givenName;
+    person->lastName = contact->familyName;
+    person->fullName = platform::fullNameOfContact(*contact, services().locale.get()->localeId());
+    person->identifier = platform::assistantIdentifierForContactIdentifier(contact->identifier);
+  }
+  return person;
+}
+
+std::shared_ptr<AXPerson> KYNAXLocation::friendPerson() const {
+  if (!avixLocation || !avixLocation->friend_) return nullptr;
+  return avixLocation->friend_->object;
+}
+
+std::optional<std::string> KYNAXLocation::friendEmail() const {
+  const auto person = friendPerson();
+  if (!person || !person->emails || person->emails->empty() || !person->emails->back()) return std::nullopt;
+  return person->emails->back()->emailAddress;
+}
+
+std::optional<std::string> KYNAXLocation::friendPhone() const {
+  const auto person = friendPerson();
+  if (!person || !person->phones || person->phones->empty() || !person->phones->back()) return std::nullopt;
+  return person->phones->back()->number;
+}
+
+std::optional<std::string> KYNAXLocation::friendName() const {
+  const auto person = friendPerson();
+  if (person && person->fullName && !person->fullName->empty()) return person->fullName;
+  return friendHandlePretty();
+}
+
+std::optional<std::string> KYNAXLocation::friendHandle() const {
+  if (auto email = friendEmail()) return email;
+  return friendPhone();
+}
+
+std::optional<std::string> KYNAXLocation::friendHandlePretty() const {
+  if (auto email = friendEmail()) return email;
+  if (auto phone = friendPhone()) return formatPhoneNumber(*phone);
+  return std::nullopt;
+}
+
+std::optional<std::string> KYNAXLocation::unformattedHandle() const {
+  if (auto email = friendEmail()) return email;
+  if (auto phone = friendPhone()) return unformatPhoneNumber(*phone);
+  return std::nullopt;
+}
+
+bool KYNAXLocation::isPhone() const { return friendPhone() && !friendEmail(); }
+
+std::string KYNAXLocation::formatPhoneNumber(const std::string& number) const {
+  return platform::formatPhoneNumber(number, "", platform::PhoneNumberStyle::Display).value_or(number);
+}
+
+std::string KYNAXLocation::unformatPhoneNumber(const std::string& number) const {
+  return platform::keepCodePoints(number, [](char32_t c) { return c == U'+' || platform::isDecimalDigit(c); });
+}
+
+std::string KYNAXLocation::description() const {
+  return "<KYNAXLocation " + (avixLocation ? avixLocation->description() : std::string("(null)")) + ">";
+}
+
+}  // namespace kyn

@@ -1,0 +1,81 @@
+#pragma once
+
+#include "model/KYNAXBaseModel.h"
+#include "platform/assistant/Model.h"
+#include "platform/image/Image.h"
+#include "platform/localization/Localization.h"
+#include "platform/value/Value.h"
+
+#include <memory>
+#include <optional>
+#include <string>
+
+namespace kyn {
+
+/// One friend's whereabouts: an assistant location filled from the server's friend location entry,
+/// with the friend's identity from the user's contacts and the texts that describe the place.
+class KYNAXLocation : public KYNAXBaseModel {
+ public:
+  /// Decodes `entry` (a friend location entry, or nothing) for `handle`; without a person, one is
+  /// built from the contacts.
+  KYNAXLocation(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person, const Value* entry);
+  /// Wraps an assistant location as it is: nothing decoded, no person looked up.
+  explicit KYNAXLocation(std::shared_ptr<AXKynLocation> avixLocation);
+  ~KYNAXLocation() override = default;
+
+  [[nodiscard]] static std::shared_ptr<KYNAXLocation> locationWithHandle(const std::optional<std::string>& handle,
+                                                                         std::shared_ptr<AXPerson> person,
+                                                                         const Value* entry);
+  [[nodiscard]] static std::shared_ptr<KYNAXLocation> locationWithAvixLocation(std::shared_ptr<AXKynLocation> location);
+
+  /// Replaces `avixLocation` with one decoded from `entry`. Values of the wrong type read as absent.
+  void decodeHandle(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person, const Value* entry);
+
+  /// Latitude and longitude are both present (zero counts as present).
+  [[nodiscard]] bool hasCoordinate() const;
+  /// The short place text: the label, else city and state, else "LOCATING" (`located` false) or
+  /// "NO_LOCATION" (`located` true), localised.
+  [[nodiscard]] virtual std::optional<std::string> friendLocation(bool located) const;
+  /// The shared decimal formatter of the user's current locale.
+  [[nodiscard]] static std::shared_ptr<platform::NumberFormatting> numberFormatter();
+  /// The plug-in's string tables.
+  [[nodiscard]] static std::shared_ptr<platform::Localization> bundle();
+
+  // ---- Identity ----
+
+  /// A person for an e-mail handle: the handle as its one e-mail entry, names and identifier from
+  /// the matching contact when there is one.
+  [[nodiscard]] std::shared_ptr<AXPerson> personForEmailFromContacts(const std::optional<std::string>& email) const;
+  /// The same for a phone handle.
+  [[nodiscard]] std::shared_ptr<AXPerson> personForPhoneFromContacts(const std::optional<std::string>& phone) const;
+
+  /// The full name, or the pretty handle when the name is absent or empty.
+  [[nodiscard]] std::optional<std::string> friendName() const;
+  /// The address of the friend's last e-mail entry.
+  [[nodiscard]] std::optional<std::string> friendEmail() const;
+  /// The number of the friend's last phone entry.
+  [[nodiscard]] std::optional<std::string> friendPhone() const;
+  /// The e-mail address, else the phone number.
+  [[nodiscard]] std::optional<std::string> friendHandle() const;
+  /// The e-mail address, else the phone number formatted for display.
+  [[nodiscard]] std::optional<std::string> friendHandlePretty() const;
+  /// The e-mail address, else the phone number reduced to digits and "+".
+  [[nodiscard]] std::optional<std::string> unformattedHandle() const;
+  /// A phone number and no e-mail address.
+  [[nodiscard]] bool isPhone() const;
+
+  /// The number in the international display format; unchanged when it cannot be read.
+  [[nodiscard]] std::string formatPhoneNumber(const std::string& number) const;
+  /// Only the decimal digits (of any script) and "+", in order.
+  [[nodiscard]] std::string unformatPhoneNumber(const std::string& number) const;
+
+  [[nodiscard]] std::string description() const override;
+
+  std::shared_ptr<AXKynLocation> avixLocation;
+  std::shared_ptr<const platform::Image> cachedFriendImage;
+
+ protected:
+  [[nodiscard]] std::shared_ptr<AXPerson> friendPerson() const;
+};
+
+}  // namespace kyn

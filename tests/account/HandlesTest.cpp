@@ -1,0 +1,90 @@
+#include "account/Common.h"
+#include "support/FakeContactStore.h"
+#include "support/PlatformTest.h"
+
+namespace kyn {
+namespace {
+
+using platform::services;
+
+class HandlesTest : public test::PlatformTest {
+ protected:
+  void SetUp() override {
+    PlatformTest::SetUp();
+    services().locale.set(std::make_shared<platform::IcuLocaleInfo>("en_US"));
+    store = std::make_shared<test::FakeContactStore>();
+    services().contactStore.set(store);
+  }
+  static std::shared_ptr<AXPerson> person(std::vector<std::optional<std::string>> phones,
+                                          std::vector<std::optional<std::string>> emails) {
+    auto p = std::make_shared<AXPerson>();
+    if (!phones.empty()) p->phones.emplace();
+    for (auto& n : phones) {
+      p->phones->push_back(std::make_shared<AXPhone>());
+      p->phones->back()->number = n;
+    }
+    if (!emails.empty()) p->emails.emplace();
+    for (auto& e : emails) {
+      p->emails->push_back(std::make_shared<AXEmail>());
+      p->emails->back()->emailAddress = e;
+    }
+    return p;
+  }
+  Common common;
+  std::shared_ptr<test::FakeContactStore> store;
+};
+
+TEST_F(HandlesTest, OnlyLeadingJunkIsCutBeforeParsing) {
+  EXPECT_EQ(common.completeNumberForPhoneNumber("Mobile: +1 (408) 555-0100"), "+14085550100");
+  EXPECT_EQ(common.completeNumberForPhoneNumber("(408) 555-0100"), "+14085550100");
+  EXPECT_EQ(common.completeNumberForPhoneNumber("ext. 12"), "12");  // cut, and too short to be a number
+  EXPECT_EQ(common.completeNumberForPhoneNumber("ext. x"), "ext. x");  // nothing to cut, no number
+  EXPECT_EQ(common.completeNumberForPhoneNumber("Ada Lovelace"), "Ada Lovelace");
+  EXPECT_EQ(common.completeNumberForPhoneNumber("tel \u0664\u0660\u0668\u0665\u0665\u0665\u0660\u0661\u0660\u0660"),
+            "+14085550100");
+}
+
+TEST_F(HandlesTest, EmptyAndAbsentNumbers) {
+  EXPECT_EQ(common.completeNumberForPhoneNumber(""), "");
+  EXPECT_EQ(common.completeNumberForPhoneNumber(std::nullopt), std::nullopt);
+}
+
+TEST_F(HandlesTest, TheLocalesCountryReadsNationalNumbers) {
+  services().locale.set(std::make_shared<platform::IcuLocaleInfo>("en_GB"));
+  EXPECT_EQ(Common::defaultCountryCode(), "gb");
+  EXPECT_EQ(common.completeNumberForPhoneNumber("020 7946 0018"), "+442079460018");
+  services().locale.set(std::make_shared<platform::IcuLocaleInfo>("fr"));  // no country
+  EXPECT_EQ(Common::defaultCountryCode(), "us");
+  EXPECT_EQ(common.completeNumberForPhoneNumber("(408) 555-0100"), "+14085550100");
+}
+
+TEST_F(HandlesTest, PhonesFirstThenEmailsWithDuplicatesKept) {
+  const auto p = person({"(503) 555-0101", "503.555.0101"}, {"ada@example.com"});
+  EXPECT_EQ(common.handlesForAXPerson(*p),
+            (std::vector<std::string>{"+15035550101", "+15035550101", "ada@example.com"}));
+}
+
+TEST_F(HandlesTest, WithoutPhonesOfItsOwnThePersonsContactLendsItsNumbers) {
+  auto& contact = store->add("ada-1");
+  contact.phoneNumbers = {{"mobile", "(503) 555-0101"}, {"work", "+44 20 7946 0018"}};
+  auto p = person({}, {"Ada@Example.com"});
+  p->identifier = platform::assistantIdentifierForContactIdentifier("ada-1");
+  EXPECT_EQ(common.handlesForAXPerson(*p),
+            (std::vector<std::string>{"+15035550101", "+442079460018", "Ada@Example.com"}));
+  // A phone entry without a number brings nothing, so the contact still lends its numbers.
+  auto q = person({std::nullopt}, {});
+  q->identifier = p->identifier;
+  EXPECT_EQ(common.handlesForAXPerson(*q).size(), 2u);
+  // A person with a number of its own never gets the contact's.
+  auto r = person({"+1 503 555 0199"}, {});
+  r->identifier = p->identifier;
+  EXPECT_EQ(common.handlesForAXPerson(*r), (std::vector<std::string>{"+15035550199"}));
+}
+
+TEST_F(HandlesTest, APersonWithNothingHasNoHandles) {
+  EXPECT_TRUE(common.handlesForAXPerson(AXPerson{}).empty());
+  EXPECT_TRUE(common.handlesForAXPerson(*person({}, {std::nullopt})).empty());  // address-less entry skipped
+}
+
+}  // namespace
+}  // namespace kyn

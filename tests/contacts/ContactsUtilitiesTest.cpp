@@ -1,0 +1,122 @@
+#include "contacts/ContactsUtilities.h"
+#include "support/FakeContactStore.h"
+#include "support/PlatformTest.h"
+
+namespace kyn {
+namespace {
+
+using platform::services;
+using ContactRef = ContactsUtilities::ContactRef;
+
+class ContactsUtilitiesTest : public test::PlatformTest {
+ protected:
+  void SetUp() override {
+    PlatformTest::SetUp();
+    store = std::make_shared<test::FakeContactStore>();
+    services().contactStore.set(store);
+  }
+  std::shared_ptr<test::FakeContactStore> store;
+};
+
+ContactRef contactWith(std::string id, bool picture, bool thumbnail = false) {
+  auto c = std::make_shared<platform::Contact>();
+  c->identifier = std::move(id);
+  if (picture) c->imageData = test::tinyPicture();
+  if (thumbnail) c->thumbnailImageData = test::tinyPicture();
+  return c;
+}
+
+TEST(OptimalContact, PrefersTheFirstWithAFullPicture) {
+  using V = std::vector<ContactRef>;
+  const V onlyThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&onlyThird)->identifier, "c");
+  const V none{contactWith("a", false), contactWith("b", false, true), contactWith("c", false)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&none)->identifier, "a");
+  const V both{contactWith("a", true), contactWith("b", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&both)->identifier, "a");
+  const V single{contactWith("a", false)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&single)->identifier, "a");
+  const V empty;
+  EXPECT_FALSE(ContactsUtilities::findOptimalContactInContacts(&empty));
+  EXPECT_FALSE(ContactsUtilities::findOptimalContactInContacts(nullptr));
+}
+
+TEST_F(ContactsUtilitiesTest, EmptyOrAbsentTextsNeverReachTheStore) {
+  EXPECT_FALSE(ContactsUtilities::contactForEmail(""));
+  EXPECT_FALSE(ContactsUtilities::contactForEmail(std::nullopt));
+  EXPECT_FALSE(ContactsUtilities::contactForPhone(""));
+  EXPECT_FALSE(ContactsUtilities::contactForPhone(std::nullopt));
+  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(std::nullopt));
+  EXPECT_FALSE(ContactsUtilities::contactForAssistantId("https://example.com/not-ours"));
+  EXPECT_EQ(store->queries, 0);
+}
+
+TEST_F(ContactsUtilitiesTest, FindsByEmailPhoneAndAssistantIdentifierFetchingTheKeyList) {
+  auto& ada = store->add("ada-1");
+  ada.givenName = "Ada";
+  ada.emailAddresses = {{"home", "Ada@Example.com"}};
+  ada.phoneNumbers = {{"mobile", "(503) 555-0101"}};
+  EXPECT_EQ(ContactsUtilities::contactForEmail("ada@example.com")->givenName, "Ada");
+  EXPECT_EQ(ContactsUtilities::contactForPhone("+15035550101")->identifier, "ada-1");
+  EXPECT_EQ(ContactsUtilities::contactForAssistantId(platform::assistantIdentifierForContactIdentifier("ada-1"))
+                ->identifier,
+            "ada-1");
+  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(platform::assistantIdentifierForContactIdentifier("nobody")));
+  EXPECT_EQ(store->lastKeys, ContactsUtilities::contactKeys());
+  EXPECT_FALSE(ContactsUtilities::contactForEmail("grace@example.com"));
+}
+
+TEST_F(ContactsUtilitiesTest, OfSeveralMatchesTheOneWithAPictureIsChosen) {
+  store->add("first").emailAddresses = {{std::nullopt, "shared@example.com"}};
+  auto& second = store->add("second");
+  second.emailAddresses = {{std::nullopt, "shared@example.com"}};
+  second.thumbnailImageData = test::tinyPicture();  // a thumbnail is no picture
+  auto& third = store->add("third");
+  third.emailAddresses = {{std::nullopt, "shared@example.com"}};
+  third.imageData = test::tinyPicture();
+  EXPECT_EQ(ContactsUtilities::contactForEmail("shared@example.com")->identifier, "third");
+}
+
+TEST_F(ContactsUtilitiesTest, WithoutAStoreNothingIsFound) {
+  services().contactStore.set(nullptr);
+  services().contactStore.set(nullptr);
+  EXPECT_FALSE(ContactsUtilities::contactForEmail("ada@example.com"));
+  EXPECT_FALSE(ContactsUtilities::contactForPhone("+15035550101"));
+  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(platform::assistantIdentifierForContactIdentifier("x")));
+}
+
+TEST(ContactKeys, ThirtyInTheirFixedOrder) {
+  const auto keys = ContactsUtilities::contactKeys();
+  ASSERT_EQ(keys.size(), 30u);
+  EXPECT_EQ(keys.front(), "fullNameFormatterKeys");
+  EXPECT_EQ(keys[8], "phoneticGivenName");
+  EXPECT_EQ(keys[9], "phoneticMiddleName");
+  EXPECT_EQ(keys[10], "organizationName");  // the phonetic family name is not asked for
+  EXPECT_EQ(keys[17], "imageData");
+  EXPECT_EQ(keys[22], "phoneNumbers");
+  EXPECT_EQ(keys.back(), "instantMessageAddresses");
+  // Every key names a property the store knows.
+  std::string unknown;
+  (void)platform::projectContact(platform::Contact{}, keys, &unknown);
+  EXPECT_EQ(unknown, "");
+}
+
+TEST(ContactImages, OnlyAFullPictureThatDecodesCounts) {
+  EXPECT_FALSE(ContactsUtilities::imageForContact(nullptr));
+  EXPECT_FALSE(ContactsUtilities::imageForContact(contactWith("t", false, true)));
+  EXPECT_EQ(ContactsUtilities::imageForContact(contactWith("p", true))->width, 2);
+  auto broken = std::make_shared<platform::Contact>();
+  broken->imageData = std::make_shared<const std::vector<std::uint8_t>>(std::vector<std::uint8_t>{1, 2, 3});
+  EXPECT_FALSE(ContactsUtilities::imageForContact(broken));
+}
+
+TEST(ContactPhoneNumbers, InOrderWithDuplicatesAndNeverAbsent) {
+  EXPECT_TRUE(ContactsUtilities::phoneNumbersForContact(nullptr).empty());
+  auto c = std::make_shared<platform::Contact>();
+  EXPECT_TRUE(ContactsUtilities::phoneNumbersForContact(c).empty());
+  c->phoneNumbers = {{"home", "1"}, {"work", "2"}, {std::nullopt, "1"}};
+  EXPECT_EQ(ContactsUtilities::phoneNumbersForContact(c), (std::vector<std::string>{"1", "2", "1"}));
+}
+
+}  // namespace
+}  // namespace kyn

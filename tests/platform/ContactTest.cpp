@@ -1,0 +1,110 @@
+#include "platform/contacts/Contact.h"
+#include "platform/image/Image.h"
+#include "support/FakeContactStore.h"
+
+#include <gtest/gtest.h>
+
+namespace kyn::platform {
+namespace {
+
+Contact sample() {
+  Contact c;
+  c.identifier = "card-1";
+  c.namePrefix = "Dr.";
+  c.givenName = "Ada";
+  c.middleName = "King";
+  c.familyName = "Lovelace";
+  c.nameSuffix = "Jr.";
+  c.organizationName = "Analytical Works";
+  c.note = "private";
+  c.imageData = test::tinyPicture();
+  c.phoneNumbers = {{"mobile", "+15035550101"}};
+  c.emailAddresses = {{"home", "ada@example.com"}};
+  return c;
+}
+
+TEST(ContactProjection, KeepsOnlyWhatTheKeysName) {
+  std::string unknown;
+  const Contact p = projectContact(sample(), {"givenName", "emailAddresses", "noSuchKey"}, &unknown);
+  EXPECT_EQ(p.identifier, "card-1");
+  EXPECT_EQ(p.givenName, "Ada");
+  EXPECT_EQ(p.emailAddresses.size(), 1u);
+  EXPECT_FALSE(p.familyName);
+  EXPECT_FALSE(p.note);
+  EXPECT_FALSE(p.imageData);
+  EXPECT_TRUE(p.phoneNumbers.empty());
+  EXPECT_EQ(unknown, "noSuchKey");
+}
+
+TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePart) {
+  const Contact p = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
+  EXPECT_EQ(fullNameOfContact(p, "en_US"), fullNameOfContact(sample(), "en_US"));
+  EXPECT_FALSE(p.note);
+}
+
+TEST(ContactFullName, TheCardsOwnNameWins) {
+  Contact c = sample();
+  c.formattedName = "Countess Ada";
+  EXPECT_EQ(fullNameOfContact(c, "en_US"), "Countess Ada");
+  c.formattedName = "";
+  EXPECT_EQ(fullNameOfContact(c, "en_US"), "Dr. Ada King Lovelace Jr.");
+}
+
+TEST(ContactFullName, PartsInTheLocalesOrder) {
+  Contact c;
+  c.givenName = "Taro";
+  c.familyName = "Yamada";
+  EXPECT_EQ(fullNameOfContact(c, "en_GB"), "Taro Yamada");
+  EXPECT_EQ(fullNameOfContact(c, "ja_JP"), "YamadaTaro");
+  EXPECT_EQ(fullNameOfContact(c, "hu"), "Yamada Taro");
+  EXPECT_EQ(fullNameOfContact(c, "de_DE"), "Taro Yamada");
+}
+
+TEST(ContactFullName, OrganisationsAndNamelessContacts) {
+  Contact org;
+  org.contactType = ContactType::Organization;
+  org.givenName = "Front";
+  org.organizationName = "Example Bakery";
+  EXPECT_EQ(fullNameOfContact(org, "en_US"), "Example Bakery");
+  Contact onlyOrg;
+  onlyOrg.organizationName = "Example Bakery";
+  EXPECT_EQ(fullNameOfContact(onlyOrg, "en_US"), "Example Bakery");
+  Contact nothing;
+  nothing.emailAddresses = {{std::nullopt, "x@example.com"}};
+  nothing.nickname = "X";
+  EXPECT_FALSE(fullNameOfContact(nothing, "en_US"));
+}
+
+TEST(AssistantIdentifier, MapsBothWaysForAnyIdentifier) {
+  for (const char* id : {"card-1", "urn:uuid:4fbe8971-0bc3-424c-9c26-36c3e1eff6b1", "a/b?c=d&e#f", "Zoë 東京",
+                         "contacts.vcf#3"}) {
+    const std::string url = assistantIdentifierForContactIdentifier(id);
+    EXPECT_TRUE(url.starts_with("x-kyn-contact:"));
+    EXPECT_EQ(url.find_first_of(" ?#&/"), std::string::npos) << url;
+    EXPECT_EQ(contactIdentifierForAssistantIdentifier(url), id);
+  }
+  for (const char* foreign : {"", "x-kyn-contact:", "x-kyn-contact:%zz", "https://example.com/a", "card-1"}) {
+    EXPECT_FALSE(contactIdentifierForAssistantIdentifier(foreign)) << foreign;
+  }
+}
+
+TEST(ImageDecoding, DecodesPicturesAndRefusesTheRest) {
+  const auto picture = decodeImage(*test::tinyPicture());
+  ASSERT_TRUE(picture);
+  EXPECT_EQ(picture->width, 2);
+  EXPECT_EQ(picture->height, 1);
+  EXPECT_EQ(picture->channels, 1);
+  EXPECT_EQ(picture->pixels, (std::vector<std::uint8_t>{0x10, 0xF0}));
+
+  EXPECT_FALSE(decodeImage({}));
+  const std::string junk = "definitely not a picture";
+  EXPECT_FALSE(decodeImage(std::span(reinterpret_cast<const std::uint8_t*>(junk.data()), junk.size())));
+  // A header that promises 40000 x 40000 pixels is refused before anything is allocated.
+  const std::string forged = "P5\n40000 40000\n255\n\x01";
+  EXPECT_FALSE(decodeImage(std::span(reinterpret_cast<const std::uint8_t*>(forged.data()), forged.size())));
+  const std::string truncated = "P5\n20";  // the header ends before the size
+  EXPECT_FALSE(decodeImage(std::span(reinterpret_cast<const std::uint8_t*>(truncated.data()), truncated.size())));
+}
+
+}  // namespace
+}  // namespace kyn::platform

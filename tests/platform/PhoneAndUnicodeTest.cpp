@@ -1,0 +1,93 @@
+#include "platform/phone/PhoneNumbers.h"
+#include "platform/text/Unicode.h"
+
+#include <gtest/gtest.h>
+
+namespace kyn::platform {
+namespace {
+
+TEST(PhoneNumbers, CanonicalFormIsOneTextPerNumber) {
+  for (const char* written : {"(408) 555-0100", "408.555.0100", "+1 408 555 0100", "1-408-555-0100", "4085550100"}) {
+    EXPECT_EQ(formatPhoneNumber(written, "us", PhoneNumberStyle::Canonical), "+14085550100") << written;
+  }
+  EXPECT_EQ(formatPhoneNumber("030 901820", "de", PhoneNumberStyle::Canonical), "+4930901820");
+  EXPECT_EQ(formatPhoneNumber("01 99 00 12 34", "fr", PhoneNumberStyle::Canonical), "+33199001234");
+}
+
+TEST(PhoneNumbers, TheRegionDecidesNumbersWithoutAnInternationalPrefix) {
+  EXPECT_EQ(formatPhoneNumber("020 7946 0018", "gb", PhoneNumberStyle::Canonical), "+442079460018");
+  EXPECT_NE(formatPhoneNumber("020 7946 0018", "us", PhoneNumberStyle::Canonical), "+442079460018");
+  // Without a region only international numbers can be read.
+  EXPECT_FALSE(formatPhoneNumber("(408) 555-0100", "", PhoneNumberStyle::Display));
+  EXPECT_EQ(formatPhoneNumber("+14085550100", "", PhoneNumberStyle::Display), "+1 408-555-0100");
+}
+
+TEST(PhoneNumbers, DigitsOfOtherScriptsAreRead) {
+  EXPECT_EQ(formatPhoneNumber("\u0664\u0660\u0668 \u0665\u0665\u0665 \u0660\u0661\u0660\u0660", "us",
+                              PhoneNumberStyle::Canonical),
+            "+14085550100");  // Arabic-Indic digits
+}
+
+TEST(PhoneNumbers, TextsThatAreNoNumberGiveNothing) {
+  for (const char* text : {"", "Ada", "BusinessPhone", "+", "\xFF\xFE", "--"}) {
+    EXPECT_FALSE(formatPhoneNumber(text, "us", PhoneNumberStyle::Canonical)) << text;
+  }
+  EXPECT_FALSE(formatPhoneNumber(std::string(300, '5'), "us", PhoneNumberStyle::Canonical));
+  EXPECT_FALSE(formatPhoneNumber("4085550100", "zz-not-a-region", PhoneNumberStyle::Canonical));
+  // Lengths impossible for the country.
+  EXPECT_FALSE(formatPhoneNumber("12", "us", PhoneNumberStyle::Canonical));
+  EXPECT_FALSE(formatPhoneNumber("11111111111111111", "us", PhoneNumberStyle::Canonical));
+  EXPECT_EQ(formatPhoneNumber("555-0100", "us", PhoneNumberStyle::Canonical), "+15550100");  // no area code
+}
+
+TEST(Unicode, DecimalDigitsOfEveryScript) {
+  for (char32_t c : {U'0', U'9', U'\u0664', U'\u0968', U'\uFF15', U'\U0001D7CE'}) EXPECT_TRUE(isDecimalDigit(c)) << static_cast<std::uint32_t>(c);
+  for (char32_t c : {U'a', U'+', U'\u00B2', U'\u2164', U'\u4E09'}) EXPECT_FALSE(isDecimalDigit(c)) << static_cast<std::uint32_t>(c);  // ², Ⅴ, 三
+}
+
+TEST(Unicode, CaseFoldingForComparisons) {
+  EXPECT_EQ(foldCase("Ada@Example.COM"), foldCase("ada@example.com"));
+  EXPECT_EQ(foldCase("STRASSE"), foldCase("Straße"));
+  EXPECT_EQ(foldCase("ÉLODIE"), "élodie");
+  EXPECT_EQ(foldCase("a\xFF" "b"), "a\uFFFDb");
+}
+
+TEST(Unicode, CuttingKeepsWholeCharacters) {
+  auto digit = [](char32_t c) { return isDecimalDigit(c); };
+  EXPECT_EQ(suffixFromFirstMatch("Tel: 555", digit), "555");
+  EXPECT_FALSE(suffixFromFirstMatch("no digits", digit));
+  EXPECT_EQ(suffixFromFirstMatch("", digit), std::nullopt);
+  // A combining mark that the predicate accepts sits in the middle of a character: the cut moves
+  // back to the character's start.
+  auto acute = [](char32_t c) { return c == U'\u0301'; };
+  EXPECT_EQ(suffixFromFirstMatch("xe\u0301y", acute), "e\u0301y");
+  // An emoji keycap keeps its base digit, its selector and its keycap mark together.
+  EXPECT_EQ(suffixFromFirstMatch("call 1\uFE0F\u20E3", digit), "1\uFE0F\u20E3");
+}
+
+TEST(Unicode, KeepingCodePointsDropsIllFormedBytes) {
+  auto keep = [](char32_t c) { return c == U'+' || isDecimalDigit(c); };
+  EXPECT_EQ(keepCodePoints("+1 (408) 555-0100", keep), "+14085550100");
+  EXPECT_EQ(keepCodePoints("\u0664\u0660 x", keep), "\u0664\u0660");
+  EXPECT_EQ(keepCodePoints("1\xFF\xC3" "2", keep), "12");
+}
+
+}  // namespace
+}  // namespace kyn::platform
+
+namespace kyn::platform {
+namespace {
+
+TEST(PhoneNumbers, ACanonicalTextReadsBackAsItself) {
+  // Invalid numbers on which the parser's first E.164 text is not stable.
+  for (const char* text : {"+44 0 20 7946 0018", "+39 06 698 0000", "+49000 00 7y 44phrase6 "}) {
+    const auto once = formatPhoneNumber(text, "us", PhoneNumberStyle::Canonical);
+    ASSERT_TRUE(once) << text;
+    EXPECT_EQ(formatPhoneNumber(*once, "us", PhoneNumberStyle::Canonical), once) << text;
+  }
+  // Italian numbers keep their leading zero: it belongs to the number.
+  EXPECT_EQ(formatPhoneNumber("+39 06 698 0000", "us", PhoneNumberStyle::Canonical), "+39066980000");
+}
+
+}  // namespace
+}  // namespace kyn::platform

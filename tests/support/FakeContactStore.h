@@ -1,0 +1,37 @@
+#pragma once
+
+#include "platform/contacts/ContactStore.h"
+
+#include <atomic>
+#include <mutex>
+#include <vector>
+
+namespace kyn::test {
+
+/// An address book held in memory. E-mail addresses match ignoring case; phone numbers match when
+/// their canonical forms in the US agree, or as texts. Counts every query and keeps the last keys.
+class FakeContactStore final : public platform::ContactStore {
+ public:
+  /// Adds a contact and returns it for further setting.
+  platform::Contact& add(std::string identifier);
+
+  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingEmailAddress(
+      std::string_view emailAddress, const platform::ContactKeys& keys, std::string* error) override;
+  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingPhoneNumber(
+      std::string_view phoneNumber, const platform::ContactKeys& keys, std::string* error) override;
+  std::shared_ptr<const platform::Contact> unifiedContactWithIdentifier(std::string_view identifier,
+                                                                        const platform::ContactKeys& keys,
+                                                                        std::string* error) override;
+
+  std::atomic<int> queries{0};
+  platform::ContactKeys lastKeys;
+
+ private:
+  std::mutex mutex_;
+  std::vector<platform::Contact> contacts_;
+};
+
+/// A valid 2x1 grey picture (binary PGM), for contacts that need a photo.
+[[nodiscard]] platform::ImageBytes tinyPicture();
+
+}  // namespace kyn::test
