@@ -1,5 +1,7 @@
 #include "platform/net/JsonCommand.h"
 
+#include "platform/log/Log.h"
+
 namespace kyn::platform {
 
 std::string KYJSONCommand::path() const { return "/"; }
@@ -23,6 +25,17 @@ void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& lim
   auto parsed = parseJson(body, limits);
   if (parsed && parsed->is_object()) parsedResponse_ = std::move(parsed);
   else parsedResponse_.reset();
+}
+
+void KYJSONCommand::runCompletionBlock() noexcept {
+  try {
+    const std::function<void()> block = completionBlock_;
+    if (block) block();
+  } catch (const std::exception& e) {
+    Log::shared().error("Completion of %@ failed: %@", description(), e.what());
+  } catch (...) {
+    Log::shared().error("Completion of %@ failed", description());
+  }
 }
 
 std::string KYJSONCommand::description() const {

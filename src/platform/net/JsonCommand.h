@@ -82,6 +82,9 @@ class KYJSONCommand : public Object {
   /// The callback given to the controller; kept here until the callback itself clears it.
   [[nodiscard]] const std::function<void()>& completionBlock() const noexcept { return completionBlock_; }
   void setCompletionBlock(std::function<void()> block) { completionBlock_ = std::move(block); }
+  /// Runs the completion block, if any. A copy runs, because the block may clear itself; what it
+  /// throws is caught and logged, so that it cannot reach the controller's thread.
+  void runCompletionBlock() noexcept;
 
   /// The command's class name, for descriptions.
   [[nodiscard]] virtual std::string_view commandName() const { return "KYJSONCommand"; }

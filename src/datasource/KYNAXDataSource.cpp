@@ -1,0 +1,95 @@
+#include "datasource/KYNAXDataSource.h"
+
+#include "account/Common.h"
+#include "commands/GetLocationsCmd.h"
+#include "platform/Services.h"
+#include "platform/resources/Resources.h"
+#include "utils/KYNAXUtils.h"
+
+namespace kyn {
+
+using platform::services;
+
+KYNAXDataSource& KYNAXDataSource::dataSource() {
+  static KYNAXDataSource instance;
+  return instance;
+}
+
+KYNAXDataSource::KYNAXDataSource() {
+  // The account context must outlive the data source, whose destructor completes what is in flight.
+  (void)Common::sharedInstance();
+  controller_ = platform::makeServerInteractionController(services().configuration()->transport());
+}
+
+std::shared_ptr<platform::KYServerInteractionController> KYNAXDataSource::serverInteractionController() const {
+  std::lock_guard lock(mutex_);
+  return controller_;
+}
+
+void KYNAXDataSource::setServerInteractionController(std::shared_ptr<platform::KYServerInteractionController> controller) {
+  std::shared_ptr<platform::KYServerInteractionController> previous;
+  {
+    std::lock_guard lock(mutex_);
+    previous = std::exchange(controller_, std::move(controller));
+  }
+  // `previous` goes here, outside the lock: its destructor may complete commands in flight.
+}
+
+std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command) {
+  auto& log = services().log();
+  // Reading the result parses the response and so fills the status code: it comes first.
+  auto locations = command.result();
+  log.notice("Result: %@", locations);
+  if (command.wasSuccessful()) {
+    const std::int32_t status = platform::int32Value(command.statusCode() ? &*command.statusCode() : nullptr);
+    if (status == 417) return AXCommandFailed::commandFailedWithErrorCode(AXKynNoFriendsErrorCode);
+    if (status == 411) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotAFriendErrorCode);
+    auto completed = AXKynSearchCompleted::searchCompleted();
+    completed->kynLocations = std::move(locations);
+    completed->atRequestedLocation = command.atRequestedLocation;
+    completed->searchContext = command.contextIdentifierURL();
+    return completed;
+  }
+  const std::int64_t http = command.response() ? command.response()->statusCode : 0;
+  log.notice("ERROR: Server HTTP Status: %ld", http);
+  const std::int64_t code = http == 401 ? AXKynNotLoggedInErrorCode : AXKynServiceNotAvailableErrorCode;
+  log.notice("Error code response: %ld", code);
+  return AXCommandFailed::commandFailedWithErrorCode(code);
+}
+
+void KYNAXDataSource::search(const AXKynSearch& command, AXCompletion completion) {
+  auto request = std::make_shared<GetLocationsCmd>();
+  request->currentLocation = KYNAXUtils::coreLocationForAXLocation(command.currentLocation);
+  request->requestedLocation = KYNAXUtils::coreLocationForAXLocation(command.requestedLocation);
+  request->requestedLocationLabel = command.requestedLocation ? command.requestedLocation->label : std::nullopt;
+  request->friends = command.friends;
+  request->proximity = command.proximity;
+
+  // The callback holds the command and the command holds the callback; the callback's last act
+  // breaks that cycle, whatever the assistant's completion does.
+  auto callback = [request, completion = std::move(completion)] {
+    struct ClearOnExit {
+      GetLocationsCmd& command;
+      ~ClearOnExit() { command.setCompletionBlock(nullptr); }
+    } clear{*request};
+    const auto reply = searchReply(*request);
+    if (completion) completion(reply->dictionary());
+  };
+  auto controller = serverInteractionController();
+  if (!controller) {
+    // Only reachable after the plug-in was shut down: answer rather than leave the assistant waiting.
+    request->setCompletionBlock(callback);
+    callback();
+    return;
+  }
+  controller->sendCommand(request, std::move(callback));
+}
+
+void KYNAXDataSource::loadMockLocationData() {
+  if (mockLocations_) return;
+  mockLocations_ = platform::readResourceDictionary("MockLocations");
+}
+
+void KYNAXDataSource::dataLoaded(const Value& object) { services().log().notice("dataLoaded: %@", object); }
+
+}  // namespace kyn

@@ -1,0 +1,51 @@
+#pragma once
+
+#include "platform/assistant/Model.h"
+#include "platform/net/ServerInteractionController.h"
+#include "platform/value/Value.h"
+
+#include <memory>
+#include <mutex>
+#include <optional>
+
+namespace kyn {
+
+/// The one way from an assistant command to the server: builds the server command, sends it, and
+/// maps the outcome to the assistant's reply and error codes.
+class KYNAXDataSource {
+ public:
+  /// The shared instance, created on first use with a new server interaction controller.
+  static KYNAXDataSource& dataSource();
+
+  KYNAXDataSource();
+  KYNAXDataSource(const KYNAXDataSource&) = delete;
+  KYNAXDataSource& operator=(const KYNAXDataSource&) = delete;
+
+  /// Sends a get-locations request for a validated search and returns at once; `completion` gets
+  /// the reply's dictionary once the server has answered.
+  void search(const AXKynSearch& command, AXCompletion completion);
+
+  /// Reads the "MockLocations" resource into `mockLocations` unless already read. No request path
+  /// uses it.
+  void loadMockLocationData();
+  /// Logs the object it is given.
+  void dataLoaded(const Value& object);
+
+  [[nodiscard]] std::shared_ptr<platform::KYServerInteractionController> serverInteractionController() const;
+  void setServerInteractionController(std::shared_ptr<platform::KYServerInteractionController> controller);
+
+  [[nodiscard]] const std::optional<Value>& mockLocations() const noexcept { return mockLocations_; }
+
+ private:
+  mutable std::mutex mutex_;
+  std::shared_ptr<platform::KYServerInteractionController> controller_;
+  std::optional<Value> mockLocations_;
+};
+
+/// The reply to a finished search: 417 and 411 in the body are failures, every other body status a
+/// completed search; a failed transfer is "not logged in" for HTTP 401 and "not available" otherwise.
+/// Exposed for the data source and its tests.
+class GetLocationsCmd;
+[[nodiscard]] std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command);
+
+}  // namespace kyn

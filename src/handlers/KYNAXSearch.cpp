@@ -1,0 +1,51 @@
+#include "handlers/KYNAXSearch.h"
+
+#include "account/Common.h"
+#include "datasource/KYNAXDataSource.h"
+#include "platform/Services.h"
+
+namespace kyn {
+
+using platform::services;
+
+namespace {
+
+std::shared_ptr<AXCommandFailed> checkSearch(const KYNAXSearch& search) {
+  // Only the last person counts, whatever the others hold.
+  std::shared_ptr<AXPerson> last;
+  if (search.friends && !search.friends->empty()) last = search.friends->back();
+  const bool hasTarget = (last && last->emails && !last->emails->empty()) ||
+                         (last && last->phones && !last->phones->empty()) || search.currentLocation ||
+                         search.proximity;
+  if (!hasTarget) return AXCommandFailed::commandFailedWithReason("Need at least emails or current location");
+
+  Common& common = Common::sharedInstance();
+  if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
+  common.clearKYNAccount();  // the checks below read the account afresh
+  if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
+  if (!services().session.get()->isProvisionedForLocationSharing()) {
+    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInAccountErrorCode);
+  }
+  if (common.tokenIsNotAccessible()) return AXCommandFailed::commandFailedWithErrorCode(AXKynLockedErrorCode);
+  return nullptr;
+}
+
+}  // namespace
+
+std::shared_ptr<AXCommandFailed> KYNAXSearch::_validate() {
+  auto failure = checkSearch(*this);
+  if (failure) services().log().error("Validate returning status %@", failure);
+  else services().log().notice("Validation successful.");
+  return failure;
+}
+
+void KYNAXSearch::performWithCompletion(AXCompletion completion) {
+  services().log().notice("search: %@", *this);
+  if (auto failure = _validate()) {
+    if (completion) completion(failure->dictionary());
+    return;
+  }
+  KYNAXDataSource::dataSource().search(*this, std::move(completion));
+}
+
+}  // namespace kyn
