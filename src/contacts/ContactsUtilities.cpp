@@ -41,6 +41,13 @@ ContactRef ContactsUtilities::contactForPhone(const std::optional<std::string>& 
   return findOptimalContactInContacts(&matches);
 }
 
+std::vector<ContactRef> ContactsUtilities::contactsForName(const std::string& name) {
+  auto store = contactStore();
+  if (!store || name.empty()) return {};
+  std::string error;
+  return store->unifiedContactsMatchingName(name, contactKeys(), &error);
+}
+
 ContactRef ContactsUtilities::contactForAssistantId(const std::optional<std::string>& assistantIdentifier) {
   if (!assistantIdentifier) return nullptr;
   const auto identifier = platform::contactIdentifierForAssistantIdentifier(*assistantIdentifier);

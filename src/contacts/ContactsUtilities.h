@@ -25,6 +25,8 @@ class ContactsUtilities {
   [[nodiscard]] static ContactRef contactForPhone(const std::optional<std::string>& phoneNumber);
   /// The contact behind an assistant person's identifier URL.
   [[nodiscard]] static ContactRef contactForAssistantId(const std::optional<std::string>& assistantIdentifier);
+  /// Every contact whose name holds `name`, ignoring case; empty for an empty name.
+  [[nodiscard]] static std::vector<ContactRef> contactsForName(const std::string& name);
   /// The contact's full picture decoded; nothing without one or when it does not decode.
   [[nodiscard]] static std::shared_ptr<const platform::Image> imageForContact(const ContactRef& contact);
   /// The contact's phone numbers as written, labels dropped, duplicates kept; empty for none.

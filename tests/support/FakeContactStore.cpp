@@ -66,6 +66,21 @@ std::shared_ptr<const Contact> FakeContactStore::unifiedContactWithIdentifier(st
   return nullptr;
 }
 
+std::vector<std::shared_ptr<const Contact>> FakeContactStore::unifiedContactsMatchingName(std::string_view name,
+                                                                                       const ContactKeys& keys,
+                                                                                       std::string* /*error*/) {
+  ++queries;
+  std::lock_guard lock(mutex_);
+  lastKeys = keys;
+  std::vector<std::shared_ptr<const Contact>> out;
+  for (const auto& c : contacts_) {
+    if (platform::contactMatchesName(c, name, "en_US")) {
+      out.push_back(std::make_shared<const Contact>(platform::projectContact(c, keys)));
+    }
+  }
+  return out;
+}
+
 platform::ImageBytes tinyPicture() {
   static const std::string pgm = std::string("P5\n2 1\n255\n") + '\x10' + '\xF0';
   return std::make_shared<const std::vector<std::uint8_t>>(pgm.begin(), pgm.end());

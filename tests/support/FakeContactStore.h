@@ -23,6 +23,10 @@ class FakeContactStore final : public platform::ContactStore {
                                                                         const platform::ContactKeys& keys,
                                                                         std::string* error) override;
 
+  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingName(std::string_view name,
+                                                                                    const platform::ContactKeys& keys,
+                                                                                    std::string* error) override;
+
   std::atomic<int> queries{0};
   platform::ContactKeys lastKeys;
 

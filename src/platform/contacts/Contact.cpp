@@ -1,6 +1,7 @@
 #include "platform/contacts/Contact.h"
 
 #include "platform/text/StringEscapes.h"
+#include "platform/text/Unicode.h"
 
 #include <algorithm>
 #include <array>
@@ -127,6 +128,16 @@ std::optional<std::string> fullNameOfContact(const Contact& contact, std::string
   }
   if (name.empty()) return std::nullopt;
   return name;
+}
+
+bool contactMatchesName(const Contact& contact, std::string_view name, std::string_view localeId) {
+  const std::string wanted = foldCase(name);
+  if (wanted.empty()) return false;
+  auto holds = [&](const std::optional<std::string>& text) {
+    return text && foldCase(*text).find(wanted) != std::string::npos;
+  };
+  return holds(fullNameOfContact(contact, localeId)) || holds(contact.givenName) || holds(contact.familyName) ||
+         holds(contact.nickname);
 }
 
 std::string assistantIdentifierForContactIdentifier(std::string_view contactIdentifier) {

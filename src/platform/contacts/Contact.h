@@ -110,6 +110,10 @@ struct Contact {
 /// organisation or a contact without a name, the organisation name. Nothing when all are absent.
 [[nodiscard]] std::optional<std::string> fullNameOfContact(const Contact& contact, std::string_view localeId);
 
+/// True when the contact's full name (in `localeId`), given name, family name or nickname holds
+/// `name`, compared ignoring case. An empty name matches nothing.
+[[nodiscard]] bool contactMatchesName(const Contact& contact, std::string_view name, std::string_view localeId);
+
 /// The assistant identifier (a URL) of a contact identifier, and back. The mapping is a bijection:
 /// "x-kyn-contact:" followed by the percent-escaped contact identifier.
 [[nodiscard]] std::string assistantIdentifierForContactIdentifier(std::string_view contactIdentifier);

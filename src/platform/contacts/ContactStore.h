@@ -30,6 +30,11 @@ class ContactStore {
   /// The contact with this identifier, or nothing.
   [[nodiscard]] virtual std::shared_ptr<const Contact> unifiedContactWithIdentifier(
       std::string_view identifier, const ContactKeys& keys, std::string* error) = 0;
+
+  /// Every contact whose full name, given name, family name or nickname holds `name` (ignoring case),
+  /// for an assistant that turns a spoken name into a person. May scan the book.
+  [[nodiscard]] virtual std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(
+      std::string_view name, const ContactKeys& keys, std::string* error) = 0;
 };
 
 /// The address book in vCard files (2.1, 3.0 and 4.0): a folder holding .vcf files (one or more
@@ -50,6 +55,9 @@ class VCardContactStore final : public ContactStore {
                                                                                  std::string* error) override;
   std::shared_ptr<const Contact> unifiedContactWithIdentifier(std::string_view identifier, const ContactKeys& keys,
                                                               std::string* error) override;
+  std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(std::string_view name,
+                                                                          const ContactKeys& keys,
+                                                                          std::string* error) override;
 
   /// Loads now (otherwise the first look-up does). Returns the number of unified contacts.
   std::size_t load();

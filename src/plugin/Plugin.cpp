@@ -1,0 +1,221 @@
+// The plug-in's C entry points. Nothing thrown inside reaches the host: every entry point catches,
+// and every taken command is answered exactly once.
+#include "plugin/kyn_plugin.h"
+
+#include "contacts/ContactsUtilities.h"
+#include "datasource/KYNAXDataSource.h"
+#include "handlers/KYNAXSearch.h"
+#include "model/KYNAXLocation.h"
+#include "platform/Services.h"
+#include "platform/value/Json.h"
+#include "utils/KYNAXUtils.h"
+
+#include <atomic>
+#include <cstdlib>
+#include <cstring>
+#include <filesystem>
+
+namespace kyn::plugin {
+namespace {
+
+using platform::services;
+
+constexpr std::size_t kMaxCommandBytes = 1u << 20;
+
+/// Delivers the one reply of a command to the host; a second attempt is dropped and logged.
+class ReplyOnce {
+ public:
+  ReplyOnce(kyn_reply_callback callback, void* context) : callback_(callback), context_(context) {}
+
+  void deliver(const Value& reply) noexcept {
+    if (delivered_.exchange(true)) {
+      services().log().error("A second reply to one command was dropped: %@", reply);
+      return;
+    }
+    const std::string text = platform::toJson(reply);
+    try {
+      callback_(text.c_str(), context_);
+    } catch (...) {
+      services().log().error("The assistant's reply callback failed");
+    }
+  }
+
+  void fail(std::string reason) noexcept {
+    try {
+      services().log().error("Command refused: %@", reason);
+      deliver(AXCommandFailed::commandFailedWithReason(std::move(reason))->dictionary());
+    } catch (...) {
+      deliver(Value{{"class", "AXCommandFailed"}, {"reason", "Internal error"}});
+    }
+  }
+
+ private:
+  kyn_reply_callback callback_;
+  void* context_;
+  std::atomic<bool> delivered_{false};
+};
+
+/// Forwards log lines to the host.
+class CallbackLogSink final : public platform::LogSink {
+ public:
+  CallbackLogSink(kyn_log_callback callback, void* context) : callback_(callback), context_(context) {}
+  void write(const platform::LogRecord& record) noexcept override {
+    try {
+      callback_(static_cast<int>(record.level), record.message.c_str(), context_);
+    } catch (...) {
+    }
+  }
+
+ private:
+  kyn_log_callback callback_;
+  void* context_;
+};
+
+char* copyText(const std::string& text) {
+  char* out = static_cast<char*>(std::malloc(text.size() + 1));
+  if (out != nullptr) std::memcpy(out, text.c_str(), text.size() + 1);
+  return out;
+}
+
+std::shared_ptr<AXPerson> personForContact(const platform::Contact& contact) {
+  auto person = std::make_shared<AXPerson>();
+  person->firstName = contact.givenName;
+  person->lastName = contact.familyName;
+  person->fullName = platform::fullNameOfContact(contact, services().locale.get()->localeId());
+  person->identifier = platform::assistantIdentifierForContactIdentifier(contact.identifier);
+  person->emails.emplace();
+  for (const auto& e : contact.emailAddresses) {
+    person->emails->push_back(std::make_shared<AXEmail>());
+    person->emails->back()->emailAddress = e.value;
+  }
+  person->phones.emplace();
+  for (const auto& p : contact.phoneNumbers) {
+    person->phones->push_back(std::make_shared<AXPhone>());
+    person->phones->back()->number = p.value;
+  }
+  return person;
+}
+
+void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
+  const auto command = platform::parseJson(commandJson, platform::JsonLimits{kMaxCommandBytes, 64});
+  if (!command || !command->is_object()) return reply->fail("The command is not a JSON object");
+  const auto className = platform::stringValue(platform::member(*command, "class"));
+  if (!className) return reply->fail("The command names no class");
+
+  if (*className == AXKynSearch::kClassName) {
+    auto search = std::make_shared<KYNAXSearch>();
+    AXKynSearch::readFields(*search, *command);
+    search->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    return;
+  }
+  if (*className == AXKynVisibilityStateSet::kClassName || *className == AXKynGeoFenceSet::kClassName) {
+    return reply->fail(*className + " is not supported by this version of the plug-in");
+  }
+  reply->fail("Unknown command class: " + *className);
+}
+
+}  // namespace
+}  // namespace kyn::plugin
+
+using namespace kyn;
+using kyn::plugin::ReplyOnce;
+using platform::services;
+
+extern "C" {
+
+const char* kyn_plugin_version(void) { return KYN_VERSION; }
+
+int kyn_plugin_configure(const char* config_dir, const char* language) {
+  try {
+    std::filesystem::path directory = config_dir ? std::filesystem::path(config_dir)
+                                                 : platform::Configuration::defaultDirectory();
+    std::error_code ec;
+    if (config_dir != nullptr && !std::filesystem::is_directory(directory, ec)) return -1;
+    services().configure(directory);
+    if (language != nullptr && *language != '\0') services().assistantPreferences.get()->setLanguageCode(language);
+    // Commands from now on use the new transport settings; the account is read afresh anyway.
+    KYNAXDataSource::dataSource().setServerInteractionController(
+        platform::makeServerInteractionController(services().configuration()->transport()));
+    return 0;
+  } catch (...) {
+    return -1;
+  }
+}
+
+int kyn_plugin_set_log_level(const char* level) {
+  if (level == nullptr) return -1;
+  const auto parsed = platform::logLevelFromName(level);
+  if (!parsed) return -1;
+  services().log().setMinimumLevel(*parsed);
+  return 0;
+}
+
+void kyn_plugin_set_log_callback(kyn_log_callback callback, void* context) {
+  try {
+    services().log().setSink(callback ? std::make_shared<plugin::CallbackLogSink>(callback, context)
+                                      : platform::makeSystemLogSink());
+  } catch (...) {
+  }
+}
+
+int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void* context) {
+  if (command_json == nullptr || reply == nullptr) return -1;
+  std::shared_ptr<ReplyOnce> once;
+  try {
+    once = std::make_shared<ReplyOnce>(reply, context);
+    plugin::perform(command_json, once);
+  } catch (const std::exception& e) {
+    if (once) once->fail(std::string("Internal error: ") + e.what());
+    else reply(R"({"class":"AXCommandFailed","reason":"Internal error"})", context);
+  } catch (...) {
+    if (once) once->fail("Internal error");
+    else reply(R"({"class":"AXCommandFailed","reason":"Internal error"})", context);
+  }
+  return 0;
+}
+
+char* kyn_plugin_describe_location(const char* location_json, int located) {
+  if (location_json == nullptr) return nullptr;
+  try {
+    const auto parsed = platform::parseJson(location_json, platform::JsonLimits{plugin::kMaxCommandBytes, 64});
+    if (!parsed || !parsed->is_object()) return nullptr;
+    const auto record = KYNAXLocation::locationWithAvixLocation(AXKynLocation::fromDictionary(*parsed));
+    Value out = Value::object();
+    if (auto name = record->friendName()) out["name"] = *name;
+    if (auto handle = record->friendHandlePretty()) out["handle"] = *handle;
+    if (auto place = record->friendLocation(located != 0)) out["place"] = *place;
+    if (record->avixLocation->locationDate) {
+      const Value age = KYNAXUtils::dictionaryWithAgeStringsForDate(record->avixLocation->locationDate);
+      out["age"] = age[std::string(LabelStringKey)];
+      out["spokenAge"] = age[std::string(LabelAccessibilityStringKey)];
+    }
+    return plugin::copyText(platform::toJson(out));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+char* kyn_plugin_find_people(const char* name) {
+  if (name == nullptr) return nullptr;
+  try {
+    Value people = Value::array();
+    for (const auto& contact : ContactsUtilities::contactsForName(name)) {
+      if (contact) people.push_back(plugin::personForContact(*contact)->dictionary());
+    }
+    return plugin::copyText(platform::toJson(people));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+void kyn_plugin_free(char* text) { std::free(text); }
+
+void kyn_plugin_shutdown(void) {
+  try {
+    KYNAXDataSource::dataSource().setServerInteractionController(
+        platform::makeServerInteractionController(services().configuration()->transport()));
+  } catch (...) {
+  }
+}
+
+}  // extern "C"

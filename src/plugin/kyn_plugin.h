@@ -1,0 +1,62 @@
+/* The C interface of the kyn-assistant plug-in (libkyn-assistant.so), for assistants that load it
+ * with dlopen. Every function may be called from any thread; none throws or aborts. Texts are UTF-8.
+ * The command and reply formats are documented in the README ("Commands" and "Reply dictionaries"). */
+#ifndef KYN_PLUGIN_H
+#define KYN_PLUGIN_H
+
+#include <stddef.h>
+
+#ifdef __cplusplus
+extern "C" {
+#endif
+
+/* Receives the one reply to a command: the reply dictionary as a JSON text, valid during the call. */
+typedef void (*kyn_reply_callback)(const char* reply_json, void* context);
+
+/* Receives every log line: level 0 debug, 1 info, 2 default, 3 error. */
+typedef void (*kyn_log_callback)(int level, const char* message, void* context);
+
+/* The plug-in's version, such as "0.1.0". */
+const char* kyn_plugin_version(void);
+
+/* Sets the configuration directory (NULL: $XDG_CONFIG_HOME/kyn-assistant) and the assistant's
+ * language as a BCP 47 tag (NULL: config.json's, else the system's). Call it before the first
+ * command, or while no command is in flight. Returns 0, or -1 for a directory that does not exist. */
+int kyn_plugin_configure(const char* config_dir, const char* language);
+
+/* The minimum level of log lines: "debug", "info", "default", "error" or "off". Returns 0, or -1
+ * for another word. */
+int kyn_plugin_set_log_level(const char* level);
+
+/* Sends log lines to `callback` (NULL: back to the journal, or standard error without one). */
+void kyn_plugin_set_log_callback(kyn_log_callback callback, void* context);
+
+/* Performs an assistant command given as JSON, {"class": "AXKynSearch", ...}. Returns 0 when it was
+ * taken: `reply` is then called exactly once, before this function returns (a command that does not
+ * parse, names an unknown class or fails validation) or later on the plug-in's network thread.
+ * Returns -1, and never calls `reply`, only when `command_json` or `reply` is NULL. */
+int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void* context);
+
+/* Describes a friend location of a search reply (an "AXKynLocation" object as JSON) for display, in
+ * the assistant's language: a JSON object {"name", "handle", "place", "age", "spokenAge"} (absent
+ * members left out). `located` is non-zero once the search has ended. Free the text with
+ * kyn_plugin_free. NULL for a text that is no JSON object. */
+char* kyn_plugin_describe_location(const char* location_json, int located);
+
+/* The people of the user's address book whose name holds `name`, ignoring case: a JSON array of
+ * "AXPerson" objects with their e-mail addresses and phone numbers, for turning a spoken name into a
+ * person. Free the text with kyn_plugin_free. NULL for a NULL name. */
+char* kyn_plugin_find_people(const char* name);
+
+/* Frees a text returned by the plug-in. */
+void kyn_plugin_free(char* text);
+
+/* Completes every command in flight (as failed) and stops the network thread; call it before
+ * dlclose. A later command starts the thread again. */
+void kyn_plugin_shutdown(void);
+
+#ifdef __cplusplus
+}
+#endif
+
+#endif /* KYN_PLUGIN_H */
