@@ -1,9 +1,9 @@
-# The commands of the README.
+# The two commands of the README, `make demo` and `make test`, and the developers' others.
 # Each installs what is missing (Debian 12), configures, builds and runs.
 PRESET ?= release
 BUILD  := build/$(PRESET)
 
-.PHONY: all deps configure build test asan tsan fuzz clean
+.PHONY: all deps configure build test demo asan tsan fuzz bench clean
 
 all: build
 
@@ -18,6 +18,13 @@ build: configure
 
 test: build
 	@ctest --preset $(PRESET)
+
+demo: configure
+	@cmake --build --preset $(PRESET) --target kyn-assistant kyn-assistant-cli kyn-sim
+	@scripts/demo $(BUILD)
+
+bench: build
+	@for b in $(BUILD)/bin/kyn_bench_*; do echo "== $$b"; $$b; done
 
 asan:
 	@$(MAKE) --no-print-directory test PRESET=asan

@@ -1,0 +1,118 @@
+#pragma once
+
+// The pieces of an end-to-end test: a kyn-sim process on loopback, a configuration directory for
+// the plug-in, and the plug-in itself loaded with dlopen as an assistant loads it.
+
+#include "plugin/kyn_plugin.h"
+#include "support/Fakes.h"
+
+#include <nlohmann/json.hpp>
+
+#include <sys/types.h>
+
+#include <chrono>
+#include <condition_variable>
+#include <filesystem>
+#include <memory>
+#include <mutex>
+#include <optional>
+#include <string>
+#include <vector>
+
+namespace kyn::itest {
+
+using Json = nlohmann::ordered_json;
+
+inline constexpr const char* kPersonId = "P-1000001";
+inline constexpr const char* kToken = "tok-5f1c2e9a-integration";
+
+/// A running kyn-sim. Stopped (SIGTERM, then reaped) when destroyed.
+class Sim {
+ public:
+  /// Starts kyn-sim in `dir` with the data set and any further options; returns once it listens.
+  Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std::string> extraArgs = {});
+  ~Sim();
+  Sim(const Sim&) = delete;
+  Sim& operator=(const Sim&) = delete;
+
+  [[nodiscard]] int port() const noexcept { return port_; }
+  [[nodiscard]] std::filesystem::path caFile() const { return dir_ / "ca.pem"; }
+  /// The request log, one object per request.
+  [[nodiscard]] std::vector<Json> requests() const;
+  /// Stops the server now.
+  void stop();
+
+ private:
+  std::filesystem::path dir_;
+  pid_t pid_ = -1;
+  int port_ = 0;
+};
+
+/// The plug-in's configuration directory: account, token, config.json and an address book.
+struct Account {
+  explicit Account(const std::filesystem::path& dir) : dir(dir) {}
+  /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
+  void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
+             const Json& extraConfig = Json::object()) const;
+  /// Adds a vCard file to the address book.
+  void addCard(const std::string& fileName, const std::string& card) const;
+  std::filesystem::path dir;
+};
+
+/// The plug-in, loaded with dlopen; every log line is kept.
+class Plugin {
+ public:
+  Plugin();
+  ~Plugin();
+  Plugin(const Plugin&) = delete;
+  Plugin& operator=(const Plugin&) = delete;
+
+  void configure(const std::filesystem::path& configDir, const char* language = "en-US");
+
+  struct Outcome {
+    std::optional<Json> reply;  // the first reply
+    int replies = 0;            // how many came, counted after the plug-in shut down
+  };
+  /// Performs a command and waits for its reply (at most `timeout`); then shuts the network thread
+  /// down, so that any further reply would have arrived, and reports how many came.
+  Outcome perform(const std::string& commandJson, std::chrono::seconds timeout = std::chrono::seconds(30));
+  /// Performs without shutting down afterwards (for a later command on the same connection).
+  std::optional<Json> performAndWait(const std::string& commandJson,
+                                     std::chrono::seconds timeout = std::chrono::seconds(30));
+  void shutdown();
+  /// How many replies each command of `performAndWait` got; read it after `shutdown`.
+  [[nodiscard]] std::vector<int> replyCounts();
+
+  [[nodiscard]] std::vector<std::string> logLines() const;
+
+  decltype(&kyn_plugin_perform) performFn = nullptr;
+
+ private:
+  struct ReplyBox {
+    std::mutex mutex;
+    std::condition_variable arrived;
+    std::optional<Json> first;
+    int count = 0;
+    static void receive(const char* json, void* context);
+  };
+  static void onLog(int level, const char* message, void* context);
+
+  void* handle_ = nullptr;
+  decltype(&kyn_plugin_configure) configure_ = nullptr;
+  decltype(&kyn_plugin_shutdown) shutdown_ = nullptr;
+  mutable std::mutex logMutex_;
+  std::vector<std::string> log_;
+  std::vector<std::unique_ptr<ReplyBox>> boxes_;
+};
+
+/// A search command for friends given by e-mail address or phone number.
+[[nodiscard]] std::string searchFor(const std::vector<std::string>& handles, bool withMyLocation = true);
+
+/// Runs a program to its end; returns its exit status and what it printed on stdout.
+struct ProgramResult {
+  int status = -1;
+  std::string output;
+};
+[[nodiscard]] ProgramResult runProgram(const std::vector<std::string>& argv);
+
+}  // namespace kyn::itest

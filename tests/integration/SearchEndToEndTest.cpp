@@ -1,0 +1,237 @@
+// Host → plug-in → libcurl → kyn-sim over real HTTPS on loopback, and back.
+#include "Harness.h"
+
+#include <gtest/gtest.h>
+
+#include <unistd.h>
+
+#include <algorithm>
+#include <fstream>
+
+namespace kyn::itest {
+namespace {
+
+const Json kFriends = Json::parse(R"({
+  "friends": {
+    "ada@example.com": {"location": {"latitude": 45.5152, "longitude": -122.6784, "horizontalAccuracy": 65.0,
+                                     "labels": [{"label": "Work"}],
+                                     "address": {"locality": "Portland", "stateCode": "OR"}},
+                        "ageSeconds": 300},
+    "+15035550102": {"location": {"latitude": 43.6532, "longitude": -79.3832, "horizontalAccuracy": 20.0,
+                                  "address": {"locality": "Toronto", "stateCode": "ON"}},
+                     "ageSeconds": 4000},
+    "chloe@example.org": {"pending": true}
+  },
+  "serverContext": {"minCallbackIntervalInMS": 5000}
+})");
+
+const char* kAdaCard =
+    "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
+    "EMAIL;TYPE=HOME:ada@example.com\r\nEND:VCARD\r\n";
+const char* kBramCard =
+    "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:bram-1\r\nFN:Bram Tolliver\r\nN:Tolliver;Bram;;;\r\n"
+    "TEL;TYPE=CELL:(503) 555-0102\r\nEND:VCARD\r\n";
+
+class SearchEndToEnd : public ::testing::Test {
+ protected:
+  void SetUp() override {
+    account.addCard("ada.vcf", kAdaCard);
+    account.addCard("bram.vcf", kBramCard);
+  }
+  /// Starts kyn-sim, points the account at it and loads the plug-in.
+  void start(const Json& dataSet = kFriends, std::vector<std::string> simArgs = {}, bool trustSim = true,
+             const Json& config = Json::object(), const std::string& hostName = "localhost") {
+    sim = std::make_unique<Sim>(simDir.path(), dataSet, std::move(simArgs));
+    account.write(hostName + ":" + std::to_string(sim->port()),
+                  trustSim ? std::optional(sim->caFile()) : std::nullopt, config);
+    plugin = std::make_unique<Plugin>();
+    plugin->configure(configDir.path());
+  }
+  void TearDown() override {
+    if (plugin) {
+      for (const auto& line : plugin->logLines()) {
+        EXPECT_EQ(line.find(kToken), std::string::npos) << "the token was logged: " << line;
+      }
+    }
+    plugin.reset();
+  }
+  /// One search, answered exactly once.
+  Json search(const std::vector<std::string>& handles) {
+    const auto outcome = plugin->perform(searchFor(handles));
+    EXPECT_EQ(outcome.replies, 1);
+    return outcome.reply.value_or(Json());
+  }
+
+  test::TempDir simDir;
+  test::TempDir configDir;
+  Account account{configDir.path()};
+  std::unique_ptr<Sim> sim;
+  std::unique_ptr<Plugin> plugin;
+};
+
+TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
+  start();
+  const Json reply = search({"ada@example.com", "(503) 555-0102"});
+  ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
+  const Json& locations = reply["kynLocations"];
+  ASSERT_EQ(locations.size(), 2u);
+  EXPECT_EQ(locations[0]["friend"]["object"]["fullName"], "Ada Marlowe");
+  EXPECT_EQ(locations[0]["label"], "Work");
+  EXPECT_EQ(locations[0]["latitude"], 45.5152);
+  EXPECT_GT(locations[0]["distance"].get<double>(), 0.0);
+  // The server keys Bram by his canonical number, which is not how the assistant held it: he is
+  // named from the contacts instead.
+  EXPECT_EQ(locations[1]["friend"]["data"], "+15035550102");
+  EXPECT_EQ(locations[1]["friend"]["object"]["fullName"], "Bram Tolliver");
+  EXPECT_EQ(locations[1]["city"], "Toronto");
+  const std::string context = reply.value("searchContext", "");
+  EXPECT_TRUE(context.starts_with("kynServerContext://serverContext?")) << context;
+  EXPECT_EQ(context.find("sim-context-token"), std::string::npos);
+
+  const auto requests = sim->requests();
+  ASSERT_EQ(requests.size(), 1u);
+  EXPECT_EQ(requests[0]["handles"], Json::parse(R"(["ada@example.com","+15035550102"])"));
+  EXPECT_EQ(requests[0]["authorised"], true);
+  EXPECT_EQ(requests[0]["apiVersion"], "4.0");
+}
+
+TEST_F(SearchEndToEnd, APendingFriendMakesTheAnswerIncomplete) {
+  start();
+  const Json reply = search({"ada@example.com", "chloe@example.org"});
+  ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
+  EXPECT_NE(reply["searchContext"].get<std::string>().find("incomplete=1"), std::string::npos);
+}
+
+TEST_F(SearchEndToEnd, NoFriendsAndNotAFriend) {
+  start(Json::parse(R"({"friends":{}})"));
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1007);
+  plugin.reset();
+  sim.reset();
+  start();
+  EXPECT_EQ(search({"stranger@example.net"})["errorCode"], 1006);
+}
+
+TEST_F(SearchEndToEnd, AWrongTokenIsNotLoggedIn) {
+  start();
+  std::ofstream(configDir.path() / "token", std::ios::trunc) << "not-the-token\n";
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1001);
+  EXPECT_EQ(sim->requests().at(0)["authorised"], false);
+}
+
+TEST_F(SearchEndToEnd, ServerFailuresAreServiceNotAvailable) {
+  for (const char* fault : {"status:500", "reset", "truncate"}) {
+    start(kFriends, {"--fault", fault});
+    EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1005) << fault;
+    plugin.reset();
+    sim.reset();
+  }
+}
+
+TEST_F(SearchEndToEnd, AGarbageBodyIsAnEmptyCompletedSearch) {
+  start(kFriends, {"--fault", "garbage"});
+  const Json reply = search({"ada@example.com"});
+  EXPECT_EQ(reply["class"], "AXKynSearchCompleted");
+  EXPECT_FALSE(reply.contains("kynLocations"));
+}
+
+TEST_F(SearchEndToEnd, ASlowServerRunsIntoTheTimeLimit) {
+  start(kFriends, {"--fault", "slow:20000"}, true, Json{{"totalTimeoutMs", 700}});
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1005);
+}
+
+TEST_F(SearchEndToEnd, AServerThatIsDownIsServiceNotAvailable) {
+  start();
+  sim->stop();  // nothing listens on the port any more
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1005);
+}
+
+TEST_F(SearchEndToEnd, AnUntrustedCertificateIsRefused) {
+  start(kFriends, {}, /*trustSim=*/false);
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1005);
+  for (const auto& request : sim->requests()) EXPECT_NE(request.value("path", ""), "/kytrservice/friends/va/getlocations");
+}
+
+TEST_F(SearchEndToEnd, AResponseBeyondTheSizeLimitIsRefused) {
+  start(kFriends, {}, true, Json{{"maxResponseBytes", 64}});
+  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1005);
+}
+
+TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewHost) {
+  start(kFriends, {"--canonical-host", "127.0.0.1"});
+  const auto first = plugin->performAndWait(searchFor({"ada@example.com"}));
+  ASSERT_TRUE(first);
+  EXPECT_EQ((*first)["class"], "AXKynSearchCompleted") << first->dump();
+  const auto second = plugin->performAndWait(searchFor({"ada@example.com"}));
+  ASSERT_TRUE(second);
+  EXPECT_EQ((*second)["class"], "AXKynSearchCompleted");
+  plugin->shutdown();
+  EXPECT_EQ(plugin->replyCounts(), (std::vector<int>{1, 1}));
+
+  // A new process with the same configuration.
+  const auto cli = runProgram({KYN_CLI_PATH, "--config", configDir.path().string(), "--json", "search", "--friend",
+                               "ada@example.com"});
+  EXPECT_EQ(cli.status, 0) << cli.output;
+
+  std::vector<std::string> hosts;
+  for (const auto& r : sim->requests()) hosts.push_back(r.value("host", ""));
+  const std::string port = std::to_string(sim->port());
+  EXPECT_EQ(hosts, (std::vector<std::string>{"localhost:" + port, "127.0.0.1:" + port, "127.0.0.1:" + port,
+                                             "127.0.0.1:" + port}));
+  const auto prefs = Json::parse(std::ifstream(configDir.path() / "preferences" / "com.zanto.tessel.kyn.assistant.json"));
+  EXPECT_EQ(prefs["RedirectedHostKey"], "127.0.0.1:" + port);
+  const auto lines = plugin->logLines();
+  EXPECT_TRUE(std::any_of(lines.begin(), lines.end(), [&](const std::string& l) {
+    return l == "REDIRECT: localhost:" + port + " -> 127.0.0.1:" + port;
+  }));
+}
+
+TEST_F(SearchEndToEnd, ACommandThatDoesNotParseIsAnsweredOnceAtOnce) {
+  start();
+  for (const char* bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE"}) {
+    const auto outcome = plugin->perform(bad, std::chrono::seconds(1));
+    EXPECT_EQ(outcome.replies, 1) << bad;
+    ASSERT_TRUE(outcome.reply) << bad;
+    EXPECT_EQ((*outcome.reply)["class"], "AXCommandFailed");
+    EXPECT_TRUE(outcome.reply->contains("reason"));
+  }
+  EXPECT_TRUE(sim->requests().empty());
+}
+
+TEST_F(SearchEndToEnd, ShuttingDownAnswersACommandInFlight) {
+  start(kFriends, {"--fault", "slow:20000"});
+  const auto started = std::chrono::steady_clock::now();
+  const auto outcome = plugin->perform(searchFor({"ada@example.com"}), std::chrono::seconds(0));
+  EXPECT_EQ(outcome.replies, 1);
+  EXPECT_EQ((*outcome.reply)["errorCode"], 1005);
+  EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(10));
+}
+
+// The JSONTestSuite texts as get-locations answers: each one ends in exactly one reply, no crash.
+TEST_F(SearchEndToEnd, HostileBodiesEachEndInOneReply) {
+  const auto corpus = test::sharedTestData("json-parsing");
+  if (!corpus) GTEST_SKIP() << "../shared/testdata/json-parsing is not beside the project";
+  const auto body = simDir.path() / "body.json";  // a link to the text under test, never a copy
+  std::filesystem::create_symlink(*corpus / "y_object_empty.json", body);
+  start(kFriends, {"--fault", "body:" + body.string()});
+  std::vector<std::filesystem::path> texts;
+  for (const auto& e : std::filesystem::directory_iterator(*corpus)) {
+    if (e.path().extension() == ".json") texts.push_back(e.path());
+  }
+  std::sort(texts.begin(), texts.end());
+  ASSERT_GE(texts.size(), 300u);
+  for (const auto& text : texts) {
+    std::filesystem::remove(body);
+    std::filesystem::create_symlink(text, body);
+    const auto reply = plugin->performAndWait(searchFor({"ada@example.com"}), std::chrono::seconds(20));
+    ASSERT_TRUE(reply) << text.filename();
+    EXPECT_TRUE((*reply)["class"] == "AXKynSearchCompleted" || (*reply)["class"] == "AXCommandFailed")
+        << text.filename() << ": " << reply->dump();
+  }
+  plugin->shutdown();
+  const auto counts = plugin->replyCounts();
+  EXPECT_TRUE(std::all_of(counts.begin(), counts.end(), [](int n) { return n == 1; }));
+  EXPECT_EQ(sim->requests().size(), texts.size());
+}
+
+}  // namespace
+}  // namespace kyn::itest
