@@ -89,7 +89,7 @@ Router::FaultPlan Router::planFault() {
   if (options_.faultCount && n >= *options_.faultCount) return plan;
   plan.name = f.describe();
 
-  Reply r;
+  Reply& r = plan.replacement;
   switch (f.kind) {
     case Fault::Kind::None:
       return {};
@@ -117,7 +117,7 @@ Router::FaultPlan Router::planFault() {
       plan.delivery = Reply::Delivery::Truncate;  // the real answer, cut short
       return plan;
   }
-  plan.replacement = std::move(r);
+  plan.replaces = true;
   return plan;
 }
 
@@ -161,8 +161,8 @@ Outcome Router::handle(const Call& call, std::int64_t nowMs) {
 
   FaultPlan plan = route->second.faultable ? planFault() : FaultPlan{};
   out.fault = std::move(plan.name);
-  if (plan.replacement) {
-    out.reply = std::move(*plan.replacement);
+  if (plan.replaces) {
+    out.reply = std::move(plan.replacement);
     return out;
   }
   out.reply = route->second.endpoint(body, nowMs);

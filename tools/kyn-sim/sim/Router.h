@@ -77,6 +77,8 @@ class Router {
   using Endpoint = std::function<Reply(const Json& body, std::int64_t nowMs)>;
 
   Router(DataSet data, Authoriser authoriser, RouterOptions options);
+  Router(const Router&) = delete;  // endpoints refer back to the router
+  Router& operator=(const Router&) = delete;
 
   /// The port that redirects name; known once the server is bound.
   void setPort(int port) { port_ = port; }
@@ -97,7 +99,8 @@ class Router {
   // How the scripted fault shapes one request: a replacement answer, or a delay before the real one.
   struct FaultPlan {
     std::string name;
-    std::optional<Reply> replacement;
+    bool replaces = false;
+    Reply replacement;
     std::chrono::milliseconds delay{0};
     Reply::Delivery delivery = Reply::Delivery::Normal;
   };

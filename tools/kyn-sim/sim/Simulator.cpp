@@ -201,9 +201,13 @@ void Simulator::serve(const httplib::Request& request, httplib::Response& respon
 
   const auto now = std::chrono::system_clock::now();
   Outcome outcome = router_->handle(call, millisecondsSince1970(now));
+  // Recorded before the answer leaves, so a client that has its answer finds the line.
+  if (log_ || observer_) {
+    const Json line = requestLogLine(call, outcome, now);
+    if (log_) log_->record(line);
+    if (observer_) observer_(line);
+  }
   if (outcome.reply.delay.count() > 0) pause(outcome.reply.delay);
-  // Logged before the answer leaves, so a client that has its answer finds the line.
-  if (log_) log_->record(requestLogLine(call, outcome, now));
 
   Reply& reply = outcome.reply;
   if (reply.delivery == Reply::Delivery::Reset) {

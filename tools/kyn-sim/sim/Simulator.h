@@ -6,6 +6,7 @@
 
 #include <condition_variable>
 #include <filesystem>
+#include <functional>
 #include <memory>
 #include <mutex>
 #include <optional>
@@ -71,6 +72,10 @@ class Simulator {
   /// Stops serving and cuts short any scripted delay. From any thread, at any time, repeatedly.
   void stop();
 
+  /// Calls `observer` with each request's log record as the request arrives (after the decision,
+  /// before any scripted delay). Set before run(); called on connection threads.
+  void observeRequests(std::function<void(const Json&)> observer) { observer_ = std::move(observer); }
+
   [[nodiscard]] int port() const noexcept { return port_; }
   [[nodiscard]] const std::string& caPem() const noexcept { return caPem_; }
   [[nodiscard]] const Options& options() const noexcept { return options_; }
@@ -85,6 +90,7 @@ class Simulator {
   std::unique_ptr<Router> router_;
   std::unique_ptr<class RequestLog> log_;
   std::unique_ptr<httplib::SSLServer> server_;
+  std::function<void(const Json&)> observer_;
   int port_ = 0;
 
   std::mutex mutex_;
