@@ -103,8 +103,7 @@ Router::FaultPlan Router::planFault() {
       r.delivery = Reply::Delivery::Reset;
       break;
     case Fault::Kind::Garbage:
-      r.contentType = "application/octet-stream";
-      r.body = garbage();
+      r.body = garbage();  // still labelled JSON: the client must not trust the label
       break;
     case Fault::Kind::Body:
       try {
