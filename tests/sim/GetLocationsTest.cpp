@@ -74,12 +74,14 @@ TEST_F(GetLocationsTest, NoHandlesAnswersEveryFriendWithoutEmails) {
     EXPECT_FALSE(answer.contains("emails"));
     std::vector<std::string> keys;
     for (const auto& [key, value] : answer["locations"].items()) keys.push_back(key);
-    EXPECT_EQ(keys, (std::vector<std::string>{"ada@example.com", "+15035550102", "cleo@example.org", "dev@example.org"}));
+    EXPECT_EQ(keys,
+              (std::vector<std::string>{"ada@example.com", "+15035550102", "cleo@example.org", "dev@example.org"}));
   }
 }
 
 TEST_F(GetLocationsTest, EmailsFollowTheRequestOrderOnceEach) {
-  const Json answer = ask(Json{{"handles", {"cleo@example.org", "+15035550199", "ADA@example.com", "cleo@example.org"}}});
+  const Json answer =
+      ask(Json{{"handles", {"cleo@example.org", "+15035550199", "ADA@example.com", "cleo@example.org"}}});
   EXPECT_EQ(answer["emails"], Json({"cleo@example.org", "+15035550199", "ADA@example.com"}));
   // Entries are keyed as the client wrote the handle, so that it finds them.
   EXPECT_EQ(answer["locations"]["ADA@example.com"]["status"], 200);

@@ -18,9 +18,9 @@ RouterOptions canonical(std::string host) {
   return o;
 }
 
-RouterOptions faulty(const std::string& spec, std::optional<long> count = std::nullopt) {
+RouterOptions faulty(const std::string& text, std::optional<long> count = std::nullopt) {
   RouterOptions o;
-  o.fault = parseFault(spec);
+  o.fault = parseFault(text);
   o.faultCount = count;
   return o;
 }
@@ -109,7 +109,7 @@ TEST(RouterTest, ErrorsOfAuthorisationPathMethodAndBody) {
   EXPECT_EQ(router->handle(call, kNow).reply.status, 400);
 }
 
-TEST(RouterTest, FaultSpecifications) {
+TEST(RouterTest, FaultsAsWrittenOnTheCommandLine) {
   EXPECT_EQ(parseFault("status:503").status, 503);
   EXPECT_EQ(parseFault("slow:250").delay, std::chrono::milliseconds(250));
   EXPECT_EQ(parseFault("body:/tmp/a:b.json").bodyPath, "/tmp/a:b.json");
@@ -141,7 +141,7 @@ TEST(RouterTest, FaultsShapeOnlyTheFirstNFaultableRequests) {
 }
 
 TEST(RouterTest, EachFaultKind) {
-  auto first = [](const char* spec) { return makeRouter(faulty(spec))->handle(getLocations(), kNow); };
+  auto first = [](const char* text) { return makeRouter(faulty(text))->handle(getLocations(), kNow); };
 
   Outcome out = first("reset");
   EXPECT_EQ(out.reply.delivery, Reply::Delivery::Reset);

@@ -57,9 +57,9 @@ Options canonical(std::string host) {
   return o;
 }
 
-Options faulty(const std::string& spec, std::optional<long> count = std::nullopt) {
+Options faulty(const std::string& text, std::optional<long> count = std::nullopt) {
   Options o;
-  o.fault = parseFault(spec);
+  o.fault = parseFault(text);
   o.faultCount = count;
   return o;
 }

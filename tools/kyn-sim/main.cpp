@@ -46,7 +46,8 @@ const char* const kDescription =
     "header), authorised, handles, status (null after a reset), apiVersionHeader, apiVersion,\n"
     "authScheme and fault. Credentials are never logged.\n";
 
-// The token comes from a file or the environment, never from the command line where `ps` shows it.
+// The token comes from a file or the environment, never from the command line, which
+// every user's process list shows.
 std::string tokenFrom(const std::string& tokenFile) {
   if (!tokenFile.empty()) return kyn::sim::readTokenFile(tokenFile);
   if (const char* env = std::getenv("KYN_SIM_TOKEN"); env && *env) return env;

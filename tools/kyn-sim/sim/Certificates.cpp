@@ -53,7 +53,7 @@ void setCommonName(X509_NAME* name, const char* cn) {
         "subject name");
 }
 
-// Adds one extension given in OpenSSL's configuration syntax ("critical,CA:TRUE").
+// Adds one extension given in the crypto library's configuration syntax ("critical,CA:TRUE").
 void addExtension(X509* cert, X509* issuer, int nid, const std::string& value) {
   X509V3_CTX ctx;
   X509V3_set_ctx_nodb(&ctx);

@@ -30,7 +30,7 @@ struct ServerIdentity {
 [[nodiscard]] std::vector<std::string> defaultServerNames();
 
 /// Makes the CA and a server certificate for `names` (host names become DNS names, IPv4 and IPv6
-/// literals IP addresses). Throws std::runtime_error with OpenSSL's reason on failure and
+/// literals IP addresses). Throws std::runtime_error with the crypto library's reason on failure and
 /// std::invalid_argument for a name that can be neither.
 [[nodiscard]] ServerIdentity makeServerIdentity(const std::vector<std::string>& names);
 

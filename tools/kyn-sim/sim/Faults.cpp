@@ -9,11 +9,11 @@ namespace {
 
 constexpr const char* kForms = "status:CODE, slow:MS, reset, garbage, body:PATH or truncate";
 
-long number(std::string_view text, std::string_view spec) {
+long number(std::string_view digits, std::string_view fault) {
   long value = 0;
-  const auto [end, ec] = std::from_chars(text.data(), text.data() + text.size(), value);
-  if (text.empty() || ec != std::errc{} || end != text.data() + text.size()) {
-    throw std::invalid_argument("fault \"" + std::string(spec) + "\": expected a whole number");
+  const auto [end, ec] = std::from_chars(digits.data(), digits.data() + digits.size(), value);
+  if (digits.empty() || ec != std::errc{} || end != digits.data() + digits.size()) {
+    throw std::invalid_argument("fault \"" + std::string(fault) + "\": expected a whole number");
   }
   return value;
 }
@@ -33,23 +33,23 @@ std::string Fault::describe() const {
   return {};
 }
 
-Fault parseFault(std::string_view spec) {
-  const auto colon = spec.find(':');
-  const std::string_view kind = spec.substr(0, colon);
-  const std::string_view argument = colon == std::string_view::npos ? std::string_view{} : spec.substr(colon + 1);
+Fault parseFault(std::string_view text) {
+  const auto colon = text.find(':');
+  const std::string_view kind = text.substr(0, colon);
+  const std::string_view argument = colon == std::string_view::npos ? std::string_view{} : text.substr(colon + 1);
   const bool hasArgument = colon != std::string_view::npos;
 
   Fault f;
   if (kind == "status" && hasArgument) {
     f.kind = Fault::Kind::Status;
-    const long code = number(argument, spec);
+    const long code = number(argument, text);
     // 1xx would leave the client waiting for a final answer; that is not a fault of this kind.
-    if (code < 200 || code > 599) throw std::invalid_argument("fault \"" + std::string(spec) + "\": status 200 to 599");
+    if (code < 200 || code > 599) throw std::invalid_argument("fault \"" + std::string(text) + "\": status 200 to 599");
     f.status = static_cast<int>(code);
   } else if (kind == "slow" && hasArgument) {
     f.kind = Fault::Kind::Slow;
-    const long ms = number(argument, spec);
-    if (ms < 0) throw std::invalid_argument("fault \"" + std::string(spec) + "\": negative delay");
+    const long ms = number(argument, text);
+    if (ms < 0) throw std::invalid_argument("fault \"" + std::string(text) + "\": negative delay");
     f.delay = std::chrono::milliseconds(ms);
   } else if (kind == "body" && hasArgument && !argument.empty()) {
     f.kind = Fault::Kind::Body;
@@ -61,7 +61,7 @@ Fault parseFault(std::string_view spec) {
   } else if (!hasArgument && kind == "truncate") {
     f.kind = Fault::Kind::Truncate;
   } else {
-    throw std::invalid_argument("unknown fault \"" + std::string(spec) + "\"; use " + kForms);
+    throw std::invalid_argument("unknown fault \"" + std::string(text) + "\"; use " + kForms);
   }
   return f;
 }

@@ -29,6 +29,6 @@ struct Fault {
 
 /// Parses "status:CODE" (200 to 599), "slow:MS", "reset", "garbage", "body:PATH" or "truncate".
 /// Throws std::invalid_argument with the accepted forms on anything else.
-[[nodiscard]] Fault parseFault(std::string_view spec);
+[[nodiscard]] Fault parseFault(std::string_view text);
 
 }  // namespace kyn::sim

@@ -4,7 +4,7 @@
 #include "sim/Files.h"
 #include "sim/RequestLog.h"
 
-// Debian builds the HTTP library as a shared library with TLS, zlib and brotli support; its
+// The system's HTTP library is a shared library built with TLS, zlib and brotli support; its
 // classes change layout with these switches, so they must match (the pkg-config flags set them).
 #if !defined(CPPHTTPLIB_OPENSSL_SUPPORT) || !defined(CPPHTTPLIB_ZLIB_SUPPORT) || !defined(CPPHTTPLIB_BROTLI_SUPPORT)
 #error "build with the compile flags of pkg-config's cpp-httplib"
@@ -32,7 +32,7 @@ std::int64_t millisecondsSince1970(std::chrono::system_clock::time_point time) {
 }
 
 // Aborts the TCP connection under a TLS session at once, with a reset and no HTTP answer.
-// Disconnecting with AF_UNSPEC makes Linux send the RST now while the descriptor stays valid, so
+// Disconnecting with AF_UNSPEC makes the kernel send the RST now while the descriptor stays valid, so
 // the library's later write fails harmlessly and its close() touches no reused descriptor; the
 // zero linger makes that close() send a RST too should the disconnect not have.
 void resetConnection(const httplib::Request& request) {
