@@ -199,10 +199,14 @@ class ProgramTest : public ::testing::Test {
     std::vector<char*> argv;
     for (auto& a : args) argv.push_back(a.data());
     argv.push_back(nullptr);
-    ::setenv("KYN_SIM_TOKEN", kToken, 1);
+    // The token travels in the child's environment only.
+    std::string token = std::string("KYN_SIM_TOKEN=") + kToken;
+    std::vector<char*> env;
+    for (char** e = environ; *e; ++e) env.push_back(*e);
+    env.push_back(token.data());
+    env.push_back(nullptr);
     Run run;
-    EXPECT_EQ(posix_spawn(&run.pid, KYN_SIM_BINARY, &actions, nullptr, argv.data(), environ), 0);
-    ::unsetenv("KYN_SIM_TOKEN");
+    EXPECT_EQ(posix_spawn(&run.pid, KYN_SIM_BINARY, &actions, nullptr, argv.data(), env.data()), 0);
     posix_spawn_file_actions_destroy(&actions);
     ::close(out[1]);
     ::close(err[1]);
