@@ -1,0 +1,270 @@
+// End to end: the server in this process and as its own program, over real HTTPS on loopback.
+#include "sim/Files.h"
+#include "sim/Router.h"
+#include "sim/Simulator.h"
+#include "TempDir.h"
+
+#include <httplib.h>
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <csignal>
+#include <future>
+#include <sstream>
+#include <thread>
+
+#include <poll.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+extern char** environ;
+
+namespace kyn::sim {
+namespace {
+
+using std::chrono::steady_clock;
+
+constexpr const char* kPerson = "1000000001";
+constexpr const char* kToken = "s3cret-Token-41";
+constexpr const char* kData = R"({"friends": {"ada@example.com": {"location": {"latitude": 45.5, "longitude": -122.6,
+                                  "address": {"locality": "Portland"}}, "ageSeconds": 60}}})";
+constexpr const char* kBody = R"({"clientContext": {"locale": "en-US"}, "handles": ["ada@example.com"]})";
+
+std::vector<Json> readLog(const std::filesystem::path& path) {
+  std::vector<Json> lines;
+  std::istringstream in(readFile(path));
+  for (std::string line; std::getline(in, line);) lines.push_back(Json::parse(line));
+  return lines;
+}
+
+// A client that trusts only the CA the server wrote, and checks the host name against it.
+httplib::Result post(const std::filesystem::path& ca, const std::string& address, int port, const std::string& token,
+                     httplib::Headers headers = {}) {
+  httplib::SSLClient client(address, port);
+  client.set_ca_cert_path(ca.c_str());
+  client.enable_server_certificate_verification(true);
+  client.set_basic_auth(kPerson, token.c_str());
+  client.set_read_timeout(std::chrono::seconds(20));
+  headers.emplace("X-Zanto-Vorn-API-Ver", "4.0");
+  return client.Post(std::string(kGetLocationsPath).c_str(), headers, kBody, "application/json");
+}
+
+Options canonical(std::string host) {
+  Options o;
+  o.canonicalHost = std::move(host);
+  return o;
+}
+
+Options faulty(const std::string& text, std::optional<long> count = std::nullopt) {
+  Options o;
+  o.fault = parseFault(text);
+  o.faultCount = count;
+  return o;
+}
+
+class SimulatorTest : public ::testing::Test {
+ protected:
+  void start(Options options = {}) {
+    writeFileAtomically(dir / "friends.json", kData);
+    options.personId = kPerson;
+    options.token = kToken;
+    options.dataPath = dir / "friends.json";
+    options.caOut = dir / "ca.pem";
+    options.portFile = dir / "port";
+    options.logFile = dir / "log.jsonl";
+    sim = std::make_unique<Simulator>(std::move(options));
+    sim->observeRequests([this](const Json&) {
+      if (!arrived.exchange(true)) firstArrival.set_value();
+    });
+    sim->bind();  // connections queue from here on: no waiting needed
+    server = std::thread([this] { sim->run(); });
+  }
+  void TearDown() override {
+    if (sim) sim->stop();
+    if (server.joinable()) server.join();
+  }
+  httplib::Result post(const std::string& token, httplib::Headers headers = {}) {
+    return sim::post(dir / "ca.pem", "127.0.0.1", sim->port(), token, std::move(headers));
+  }
+
+  test::TempDir dir;
+  std::unique_ptr<Simulator> sim;
+  std::thread server;
+  std::atomic<bool> arrived{false};
+  std::promise<void> firstArrival;
+};
+
+TEST_F(SimulatorTest, AnswersTheRightTokenAndRefusesAWrongOne) {
+  start();
+  EXPECT_EQ(readFile(dir / "port"), std::to_string(sim->port()) + "\n");
+
+  auto res = post(kToken);
+  ASSERT_TRUE(res) << httplib::to_string(res.error());
+  EXPECT_EQ(res->status, 200);
+  EXPECT_EQ(res->get_header_value("Content-Type"), "application/json");
+  const Json answer = Json::parse(res->body);
+  EXPECT_EQ(answer["statusCode"], 200);
+  EXPECT_EQ(answer["locations"]["ada@example.com"]["location"]["address"]["locality"], "Portland");
+
+  res = post("s3cret-Token-4");
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 401);
+  EXPECT_EQ(Json::parse(res->body)["statusCode"], 401);
+
+  const auto log = readLog(dir / "log.jsonl");
+  ASSERT_EQ(log.size(), 2u);
+  EXPECT_EQ(log[0]["host"], "127.0.0.1:" + std::to_string(sim->port()));
+  EXPECT_EQ(log[0]["authorised"], true);
+  EXPECT_EQ(log[0]["apiVersion"], "4.0");
+  EXPECT_EQ(log[1]["authorised"], false);
+  EXPECT_EQ(log[1]["status"], 401);
+  EXPECT_EQ(readFile(dir / "log.jsonl").find("s3cret"), std::string::npos);
+}
+
+TEST_F(SimulatorTest, RedirectsOtherHostsToTheCanonicalOne) {
+  start(canonical("127.0.0.1"));
+  const std::string port = std::to_string(sim->port());
+  auto res = post(kToken, {{"Host", "localhost:" + port}});
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 307);
+  EXPECT_EQ(res->get_header_value("Location"), "https://127.0.0.1:" + port + std::string(kGetLocationsPath));
+
+  res = post(kToken);  // the client follows, to 127.0.0.1
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 200);
+  const auto log = readLog(dir / "log.jsonl");
+  ASSERT_EQ(log.size(), 2u);
+  EXPECT_EQ(log[0]["host"], "localhost:" + port);
+  EXPECT_EQ(log[0]["status"], 307);
+  EXPECT_EQ(log[1]["host"], "127.0.0.1:" + port);
+}
+
+TEST_F(SimulatorTest, AResetDropsTheConnectionWithoutAnAnswer) {
+  start(faulty("reset", 1));
+  const auto begin = steady_clock::now();
+  auto res = post(kToken);
+  EXPECT_FALSE(res);
+  EXPECT_EQ(res.error(), httplib::Error::Read);
+  EXPECT_LT(steady_clock::now() - begin, std::chrono::seconds(5));  // at once, not by a time limit
+
+  res = post(kToken);  // the server lives on
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 200);
+  EXPECT_EQ(readLog(dir / "log.jsonl")[0]["status"], nullptr);
+}
+
+TEST_F(SimulatorTest, ATruncatedAnswerEndsBeforeItsContentLength) {
+  start(faulty("truncate", 1));
+  auto res = post(kToken);
+  EXPECT_FALSE(res);
+  EXPECT_EQ(res.error(), httplib::Error::Read);
+  res = post(kToken);
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 200);
+}
+
+TEST_F(SimulatorTest, StopCutsASlowAnswerShort) {
+  start(faulty("slow:60000"));
+  auto client = std::async(std::launch::async, [this] { return post(kToken); });
+  ASSERT_EQ(firstArrival.get_future().wait_for(std::chrono::seconds(20)), std::future_status::ready);
+  const auto begin = steady_clock::now();
+  sim->stop();
+  server.join();
+  EXPECT_LT(steady_clock::now() - begin, std::chrono::seconds(10));
+  (void)client.get();
+}
+
+// The program itself: ready line, port file, SIGTERM, exit status, and no token in its output.
+class ProgramTest : public ::testing::Test {
+ protected:
+  struct Run {
+    pid_t pid = -1;
+    int out = -1;
+    int err = -1;
+  };
+
+  Run spawn(std::vector<std::string> args) {
+    int out[2], err[2];
+    EXPECT_EQ(::pipe(out), 0);
+    EXPECT_EQ(::pipe(err), 0);
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_adddup2(&actions, out[1], 1);
+    posix_spawn_file_actions_adddup2(&actions, err[1], 2);
+    posix_spawn_file_actions_addclose(&actions, out[0]);
+    posix_spawn_file_actions_addclose(&actions, err[0]);
+    args.insert(args.begin(), KYN_SIM_BINARY);
+    std::vector<char*> argv;
+    for (auto& a : args) argv.push_back(a.data());
+    argv.push_back(nullptr);
+    // The token travels in the child's environment only.
+    std::string token = std::string("KYN_SIM_TOKEN=") + kToken;
+    std::vector<char*> env;
+    for (char** e = environ; *e; ++e) env.push_back(*e);
+    env.push_back(token.data());
+    env.push_back(nullptr);
+    Run run;
+    EXPECT_EQ(posix_spawn(&run.pid, KYN_SIM_BINARY, &actions, nullptr, argv.data(), env.data()), 0);
+    posix_spawn_file_actions_destroy(&actions);
+    ::close(out[1]);
+    ::close(err[1]);
+    run.out = out[0];
+    run.err = err[0];
+    return run;
+  }
+
+  // Reads until a newline or the end; the time limit only guards against a hang.
+  static std::string readLine(int fd) {
+    std::string line;
+    char c;
+    pollfd p{fd, POLLIN, 0};
+    while (::poll(&p, 1, 20'000) == 1 && ::read(fd, &c, 1) == 1 && c != '\n') line += c;
+    return line;
+  }
+  static std::string readAll(int fd) {
+    std::string text;
+    char buffer[4096];
+    for (ssize_t n; (n = ::read(fd, buffer, sizeof buffer)) > 0;) text.append(buffer, static_cast<std::size_t>(n));
+    ::close(fd);
+    return text;
+  }
+  static int exitStatus(pid_t pid) {
+    int status = 0;
+    ::waitpid(pid, &status, 0);
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
+  }
+
+  test::TempDir dir;
+};
+
+TEST_F(ProgramTest, ServesUntilSigtermAndExitsCleanly) {
+  writeFileAtomically(dir / "friends.json", kData);
+  Run run = spawn({"--person", kPerson, "--data", (dir / "friends.json").string(), "--port", "0", "--ca-out",
+                   (dir / "ca.pem").string(), "--port-file", (dir / "port").string()});
+  const std::string ready = readLine(run.out);
+  const std::string port = readFile(dir / "port");
+  EXPECT_EQ(ready, "kyn-sim listening on https://127.0.0.1:" + port.substr(0, port.size() - 1));
+
+  auto res = post(dir / "ca.pem", "127.0.0.1", std::stoi(port), kToken);
+  ASSERT_TRUE(res);
+  EXPECT_EQ(res->status, 200);
+
+  ::kill(run.pid, SIGTERM);
+  EXPECT_EQ(exitStatus(run.pid), 0);
+  const std::string output = readAll(run.out) + readAll(run.err);
+  EXPECT_EQ(output, "");
+}
+
+TEST_F(ProgramTest, AMissingDataSetIsAStartupError) {
+  Run run = spawn({"--person", kPerson, "--data", (dir / "nothing.json").string()});
+  EXPECT_EQ(exitStatus(run.pid), 2);
+  EXPECT_EQ(readAll(run.out), "");
+  const std::string err = readAll(run.err);
+  EXPECT_NE(err.find("nothing.json"), std::string::npos) << err;
+  EXPECT_EQ(err.find(kToken), std::string::npos);
+}
+
+}  // namespace
+}  // namespace kyn::sim
