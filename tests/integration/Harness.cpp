@@ -3,6 +3,7 @@
 #include <dlfcn.h>
 #include <fcntl.h>
 #include <signal.h>
+#include <sys/prctl.h>
 #include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -48,16 +49,25 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
 
   int out[2];
   if (pipe2(out, O_CLOEXEC) != 0) throw std::runtime_error("pipe failed");
-  posix_spawn_file_actions_t actions;
-  posix_spawn_file_actions_init(&actions);
-  posix_spawn_file_actions_adddup2(&actions, out[1], STDOUT_FILENO);
+  const int errors = open((dir_ / "sim.err").c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
   auto argv = argvOf(args);
-  const int spawned = posix_spawn(&pid_, argv[0], &actions, nullptr, argv.data(), environ);
-  posix_spawn_file_actions_destroy(&actions);
+  const pid_t parent = getpid();
+  pid_ = fork();
+  if (pid_ == 0) {
+    // The server must not outlive the test, even one that crashes; and it must not hold the test's
+    // own output open, or the test runner would wait for it.
+    prctl(PR_SET_PDEATHSIG, SIGTERM);
+    if (getppid() != parent) _exit(1);
+    dup2(out[1], STDOUT_FILENO);
+    if (errors >= 0) dup2(errors, STDERR_FILENO);
+    execv(argv[0], argv.data());
+    _exit(127);
+  }
   close(out[1]);
-  if (spawned != 0) {
+  if (errors >= 0) close(errors);
+  if (pid_ < 0) {
     close(out[0]);
-    throw std::runtime_error(std::string("cannot start kyn-sim: ") + std::strerror(spawned));
+    throw std::runtime_error("cannot start kyn-sim");
   }
   // The one line "kyn-sim listening on https://ADDRESS:PORT" says it is ready; reading blocks until
   // it comes (or the process ends).
@@ -68,7 +78,10 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   const auto colon = line.rfind(':');
   if (line.find("listening on https://") == std::string::npos || colon == std::string::npos) {
     stop();
-    throw std::runtime_error("kyn-sim did not start: " + line);
+    std::ifstream err(dir_ / "sim.err");
+    std::stringstream text;
+    text << err.rdbuf();
+    throw std::runtime_error("kyn-sim did not start: " + line + " " + text.str());
   }
   port_ = std::stoi(line.substr(colon + 1));
 }

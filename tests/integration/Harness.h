@@ -50,7 +50,7 @@ class Sim {
 
 /// The plug-in's configuration directory: account, token, config.json and an address book.
 struct Account {
-  explicit Account(const std::filesystem::path& dir) : dir(dir) {}
+  explicit Account(std::filesystem::path directory) : dir(std::move(directory)) {}
   /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
   void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
              const Json& extraConfig = Json::object()) const;

@@ -71,14 +71,14 @@ class SearchEndToEnd : public ::testing::Test {
 
 TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   start();
-  const Json reply = search({"ada@example.com", "(503) 555-0102"});
+  Json reply = search({"ada@example.com", "(503) 555-0102"});
   ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
-  const Json& locations = reply["kynLocations"];
+  Json locations = reply["kynLocations"];
   ASSERT_EQ(locations.size(), 2u);
   EXPECT_EQ(locations[0]["friend"]["object"]["fullName"], "Ada Marlowe");
   EXPECT_EQ(locations[0]["label"], "Work");
   EXPECT_EQ(locations[0]["latitude"], 45.5152);
-  EXPECT_GT(locations[0]["distance"].get<double>(), 0.0);
+  EXPECT_GT(locations[0].value("distance", 0.0), 0.0) << locations[0].dump();
   // The server keys Bram by his canonical number, which is not how the assistant held it: he is
   // named from the contacts instead.
   EXPECT_EQ(locations[1]["friend"]["data"], "+15035550102");
@@ -97,7 +97,7 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
 
 TEST_F(SearchEndToEnd, APendingFriendMakesTheAnswerIncomplete) {
   start();
-  const Json reply = search({"ada@example.com", "chloe@example.org"});
+  Json reply = search({"ada@example.com", "chloe@example.org"});
   ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
   EXPECT_NE(reply["searchContext"].get<std::string>().find("incomplete=1"), std::string::npos);
 }
@@ -129,7 +129,7 @@ TEST_F(SearchEndToEnd, ServerFailuresAreServiceNotAvailable) {
 
 TEST_F(SearchEndToEnd, AGarbageBodyIsAnEmptyCompletedSearch) {
   start(kFriends, {"--fault", "garbage"});
-  const Json reply = search({"ada@example.com"});
+  Json reply = search({"ada@example.com"});
   EXPECT_EQ(reply["class"], "AXKynSearchCompleted");
   EXPECT_FALSE(reply.contains("kynLocations"));
 }

@@ -298,7 +298,8 @@ class CurlServerInteractionController final : public KYServerInteractionControll
       return;
     }
     request.body = toJson(command->jsonBodyDictionary());
-    for (const auto& [name, value] : command->headers().items()) {
+    const Value headers = command->headers();  // iterated below: must outlive the loop
+    for (const auto& [name, value] : headers.items()) {
       request.headers.push_back(name + ": " + (value.is_string() ? value.get<std::string>() : toJson(value)));
     }
     request.headers.emplace_back("Content-Type: application/json");
