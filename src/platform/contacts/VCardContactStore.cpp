@@ -246,7 +246,7 @@ struct VCardContactStore::Impl {
         for (const LabeledValue& email : contact.emailAddresses) addToIndex(byEmail, emailKey(email.value), position);
         contacts.push_back(std::make_shared<const Contact>(std::move(contact)));
       }
-      Log::shared().info("Contacts: %ld contacts from %ld files", static_cast<long>(contacts.size()),
+      Log::shared().info("Contacts: address book loaded: %ld contacts, %ld files", static_cast<long>(contacts.size()),
                          static_cast<long>(fileCount));
     } catch (const std::exception& e) {
       Log::shared().error("Contacts: the address book could not be loaded: %@", e.what());

@@ -211,7 +211,7 @@ TEST_F(VCardContactStoreTest, ConcurrentFirstLookUpsAllSeeTheLoadedBook) {
   go = true;
   for (auto& thread : threads) thread.join();
   EXPECT_EQ(failures.load(), 0);
-  EXPECT_EQ(logLinesContaining("300 contacts from 1 files"), 1u);
+  EXPECT_EQ(logLinesContaining("300 contacts, 1 files"), 1u);
 }
 
 TEST_F(VCardContactStoreTest, TheServicesBuildTheStoreFromTheConfiguredFolder) {
