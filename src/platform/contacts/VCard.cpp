@@ -19,8 +19,12 @@
 // How the reader treats what real exporters write:
 // - Lines end in CRLF, LF or CR, mixed freely. A line that starts with a space or tab continues the
 //   previous one (the break and that one blank are removed). A quoted-printable value that ends in
-//   "=" continues on the next line whatever that line starts with (a soft line break), and a base64
-//   value goes on over following lines made only of base64 characters until a blank line (2.1).
+//   "=" continues on the next line whatever that line starts with (a soft line break; only a fold
+//   that carries the two hex digits of the escape is read as a fold). A base64 value goes on over
+//   following lines made only of base64 characters until a blank line (2.1).
+// - Cards that end without END:VCARD, and cards over 32 MiB, are skipped and reported; text
+//   between cards is ignored. A card without UID is named "<source>#<position>", counted from 0
+//   over every card of the text, skipped ones included.
 // - A BEGIN:VCARD right after an empty AGENT property (or "AGENT:BEGIN:VCARD") opens an embedded
 //   card, which is skipped up to its END. Any other BEGIN:VCARD inside a card means the card was cut
 //   off: it is reported and the new card is read.
@@ -269,29 +273,39 @@ std::string unescapeTrimmed(std::string_view text) { return std::string(trim(une
 
 enum class Encoding { None, QuotedPrintable, Base64 };
 
-// Where the name and parameters of a property line end: the first ':' outside quotes. A quote
-// that is never closed does not hide the line's value: then the first ':' of all counts.
-std::optional<std::size_t> headEnd(std::string_view line) {
-  bool inParameters = false;
-  bool inQuotes = false;
-  for (std::size_t i = 0; i < line.size(); ++i) {
-    const char c = line[i];
-    if (inQuotes) {
-      if (c == '"') inQuotes = false;
-    } else if (c == ':') {
-      return i;
-    } else if (c == ';') {
-      inParameters = true;
-    } else if (c == '"' && inParameters) {
-      inQuotes = true;
+// Finds where the name and parameters of a property line end: the first ':' outside quotes. A quote
+// that is never closed does not hide the line's value: then the first ':' of all counts. Scans
+// only what was added since the last call, so that a line that grows by many folds costs no more.
+class HeadScanner {
+ public:
+  std::optional<std::size_t> scan(std::string_view line) {
+    for (; pos_ < line.size() && !end_; ++pos_) {
+      const char c = line[pos_];
+      if (c == ':' && !firstColon_) firstColon_ = pos_;
+      if (inQuotes_) {
+        if (c == '"') inQuotes_ = false;
+      } else if (c == ':') {
+        end_ = pos_;
+      } else if (c == ';') {
+        inParameters_ = true;
+      } else if (c == '"' && inParameters_) {
+        inQuotes_ = true;
+      }
     }
+    if (end_) return end_;
+    if (inQuotes_) return firstColon_;
+    return std::nullopt;
   }
-  if (inQuotes) {
-    const std::size_t colon = line.find(':');
-    if (colon != std::string_view::npos) return colon;
-  }
-  return std::nullopt;
-}
+
+ private:
+  std::size_t pos_ = 0;
+  bool inParameters_ = false;
+  bool inQuotes_ = false;
+  std::optional<std::size_t> end_;
+  std::optional<std::size_t> firstColon_;
+};
+
+std::optional<std::size_t> headEnd(std::string_view line) { return HeadScanner().scan(line); }
 
 struct Property {
   std::string group;  // upper case, empty when none
@@ -755,6 +769,7 @@ class LogicalLines {
     lines_.push_back(std::move(current_));
     current_.clear();
     open_ = false;
+    head_ = HeadScanner();
     encoding_.reset();
   }
 
@@ -764,6 +779,7 @@ class LogicalLines {
     lines_.clear();
     current_.clear();
     open_ = false;
+    head_ = HeadScanner();
     encoding_.reset();
   }
 
@@ -777,7 +793,7 @@ class LogicalLines {
   // The transfer encoding of the open line, read once its head is complete.
   Encoding encoding() {
     if (encoding_) return *encoding_;
-    const auto end = headEnd(current_);
+    const auto end = head_.scan(current_);
     if (!end) return Encoding::None;
     Property property;
     readParameters(std::string_view(current_).substr(0, *end), property);
@@ -788,6 +804,7 @@ class LogicalLines {
   std::vector<std::string> lines_;
   std::string current_;
   bool open_ = false;
+  HeadScanner head_;
   std::optional<Encoding> encoding_;
 };
 
