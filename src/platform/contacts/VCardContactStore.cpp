@@ -10,6 +10,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstring>
 #include <mutex>
@@ -109,9 +110,22 @@ std::optional<std::string> readFile(const fs::path& path, std::string& reason) {
   return text;
 }
 
-// Adds the second card's values to the contact unified so far: scalars that it still lacks,
-// list entries that it does not hold yet, the pictures when it has none.
-void unify(Contact& into, Contact&& from) {
+// The entries of a unified contact's lists, kept while the book loads so that unifying many cards
+// into one stays linear.
+using SeenEntries = std::array<std::unordered_set<std::string>, 8>;
+
+std::array<std::vector<LabeledValue>*, 8> listsOf(Contact& c) {
+  return {&c.phoneNumbers, &c.emailAddresses, &c.postalAddresses, &c.dates,
+          &c.urlAddresses, &c.relations,      &c.socialProfiles,  &c.instantMessageAddresses};
+}
+
+std::string entryKey(const LabeledValue& v) {
+  return (v.label ? "1" + *v.label : std::string("0")) + '\0' + v.value;
+}
+
+// Adds a later card's values to the contact unified so far: scalars that it still lacks, list
+// entries that it does not hold yet, the pictures when it has none.
+void unify(Contact& into, Contact&& from, std::unique_ptr<SeenEntries>& seen) {
   auto scalar = [](std::optional<std::string>& a, std::optional<std::string>& b) {
     if (!a && b) a = std::move(b);
   };
@@ -135,23 +149,19 @@ void unify(Contact& into, Contact&& from) {
   if (!into.imageData) into.imageData = std::move(from.imageData);
   if (!into.thumbnailImageData) into.thumbnailImageData = std::move(from.thumbnailImageData);
 
-  auto list = [](std::vector<LabeledValue>& a, std::vector<LabeledValue>& b) {
-    if (b.empty()) return;
-    std::unordered_set<std::string> present;
-    auto key = [](const LabeledValue& v) { return (v.label ? "1" + *v.label : std::string("0")) + '\0' + v.value; };
-    for (const LabeledValue& v : a) present.insert(key(v));
-    for (LabeledValue& v : b) {
-      if (present.insert(key(v)).second) a.push_back(std::move(v));
+  const auto intoLists = listsOf(into);
+  const auto fromLists = listsOf(from);
+  if (!seen) {
+    seen = std::make_unique<SeenEntries>();
+    for (std::size_t i = 0; i < intoLists.size(); ++i) {
+      for (const LabeledValue& v : *intoLists[i]) (*seen)[i].insert(entryKey(v));
     }
-  };
-  list(into.phoneNumbers, from.phoneNumbers);
-  list(into.emailAddresses, from.emailAddresses);
-  list(into.postalAddresses, from.postalAddresses);
-  list(into.dates, from.dates);
-  list(into.urlAddresses, from.urlAddresses);
-  list(into.relations, from.relations);
-  list(into.socialProfiles, from.socialProfiles);
-  list(into.instantMessageAddresses, from.instantMessageAddresses);
+  }
+  for (std::size_t i = 0; i < intoLists.size(); ++i) {
+    for (LabeledValue& v : *fromLists[i]) {
+      if ((*seen)[i].insert(entryKey(v)).second) intoLists[i]->push_back(std::move(v));
+    }
+  }
 }
 
 void addToIndex(ContactIndex& index, std::string key, std::uint32_t position) {
@@ -218,6 +228,7 @@ struct VCardContactStore::Impl {
   void loadBook() noexcept {
     try {
       std::vector<Contact> book;
+      std::vector<std::unique_ptr<SeenEntries>> seen;  // beside `book`, for contacts of several cards
       std::unordered_map<std::string, std::size_t> positionOfIdentifier;
       std::size_t fileCount = 0;
       for (const auto& [file, sourceName] : bookFiles()) {
@@ -234,8 +245,9 @@ struct VCardContactStore::Impl {
           const auto [it, added] = positionOfIdentifier.try_emplace(contact.identifier, book.size());
           if (added) {
             book.push_back(std::move(contact));
+            seen.emplace_back();
           } else {
-            unify(book[it->second], std::move(contact));
+            unify(book[it->second], std::move(contact), seen[it->second]);
           }
         }
       }
