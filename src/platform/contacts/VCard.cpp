@@ -25,6 +25,8 @@
 // - Cards that end without END:VCARD, and cards over 32 MiB, are skipped and reported; text
 //   between cards is ignored. A card without UID is named "<source>#<position>", counted from 0
 //   over every card of the text, skipped ones included.
+// - A line that reads BEGIN:VCARD or END:VCARD (any case, blanks around it ignored) always opens or
+//   closes a card, even indented: a hand-indented file loses no card that way.
 // - A BEGIN:VCARD right after an empty AGENT property (or "AGENT:BEGIN:VCARD") opens an embedded
 //   card, which is skipped up to its END. Any other BEGIN:VCARD inside a card means the card was cut
 //   off: it is reported and the new card is read.
@@ -216,6 +218,8 @@ std::string latin1ToUtf8(std::string_view bytes) {
 // bytes are UTF-8 when they are valid UTF-8 and windows-1252 otherwise, the usual other choice of
 // old exporters; declared UTF-8 keeps its valid parts and marks the rest with U+FFFD.
 std::string toUtf8(std::string bytes, std::string_view charset) {
+  // Old exporters declare US-ASCII for text that is not: read it as if no charset were given.
+  if (equalsIgnoringCase(charset, "US-ASCII") || equalsIgnoringCase(charset, "ASCII")) charset = {};
   if (charset.empty() || equalsIgnoringCase(charset, "UTF-8") || equalsIgnoringCase(charset, "UTF8")) {
     if (isValidUtf8(bytes)) return bytes;
     if (!charset.empty()) return repairUtf8(std::move(bytes));
@@ -861,17 +865,16 @@ class CardReader {
   }
 
   void inCard(std::string_view line) {
-    const bool continuation = !line.empty() && isBlank(line.front());
     if (reader_.end() - cardStart_ > kMaxCardBytes) {
       lines_.clear();
       state_ = State::TooLarge;
-      if (!continuation && isMarker(line, "END:VCARD")) {
+      if (isMarker(line, "END:VCARD")) {
         skip("is larger than 32 MiB");
         state_ = State::Outside;
       }
       return;
     }
-    if (!continuation && isMarker(line, "END:VCARD")) {
+    if (isMarker(line, "END:VCARD")) {
       lines_.finish();
       try {
         result_.contacts.push_back(contactOfCard(lines_.lines(), source_, cardIndex_));
@@ -882,7 +885,7 @@ class CardReader {
       state_ = State::Outside;
       return;
     }
-    if (!continuation && isMarker(line, "BEGIN:VCARD")) {
+    if (isMarker(line, "BEGIN:VCARD")) {
       if (previousOpensAgent_) {
         lines_.finish();
         state_ = State::Embedded;

@@ -77,7 +77,7 @@ TEST(VCardLines, FoldsInOddPlaces) {
 TEST(VCardLines, BeginAndEndIgnoreCaseAndJunkBetweenCardsIsIgnored) {
   const auto result = parseVCards(
       "garbage before\r\nFN:Not In A Card\r\nbegin:vCard\r\nFN:One\r\nEnd:VCard\r\n\r\n-- junk --\r\n"
-      "  BEGIN:VCARD  \r\nFN:Two\r\nEND:VCARD\r\ntrailing junk",
+      "  BEGIN:VCARD  \r\nFN:Two\r\n\tEND:VCARD\r\ntrailing junk",  // indented, yet no fold
       "mixed.vcf");
   ASSERT_EQ(result.contacts.size(), 2u);
   EXPECT_EQ(result.contacts[0].formattedName, "One");
@@ -305,6 +305,7 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
       "N:\x93Quoted\x94;Ren\xE9\r\n"                                // no charset, no UTF-8: windows-1252
       "ORG;CHARSET=UTF-8:Caf\xC3\xA9 \xFF\xC3 end\r\n"              // declared UTF-8: ill-formed parts marked
       "TITLE;CHARSET=x-no-such-charset:Se\xC3\xB1or\r\n"            // unknown charset: read as if none
+      "X-MAIDENNAME;CHARSET=US-ASCII:Fran\xE7ois\r\n"               // a false US-ASCII: as if none
       "NICKNAME;CHARSET=../../../etc/passwd:Pe\xF1" "a\r\n"         // never a file name for ICU
       "X-PHONETIC-FIRST-NAME;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:=C3=91=80\r\n",
       "2.1"));
@@ -314,6 +315,7 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
   EXPECT_EQ(c.givenName, "Ren\xC3\xA9");
   EXPECT_EQ(c.organizationName, "Caf\xC3\xA9 \xEF\xBF\xBD\xEF\xBF\xBD end");
   EXPECT_EQ(c.jobTitle, "Se\xC3\xB1or");
+  EXPECT_EQ(c.previousFamilyName, "Fran\xC3\xA7ois");
   EXPECT_EQ(c.nickname, "Pe\xC3\xB1" "a");
   EXPECT_EQ(c.phoneticGivenName, "\xC3\x91\xEF\xBF\xBD");
   EXPECT_TRUE(allTextIsUtf8(c));
