@@ -466,7 +466,7 @@ std::string phoneValue(const Property& property) {
       number += " ext. " + decodePercent(parameter.substr(4));
     }
   }
-  return number;
+  return toUtf8(std::move(number), {});  // escapes may have made bytes that are no UTF-8
 }
 
 std::string emailValue(const Property& property) {
@@ -588,12 +588,11 @@ Contact contactOfCard(const std::vector<std::string>& lines, std::string_view so
     auto labelOrFirstType = [&]() -> std::optional<std::string> {
       if (auto l = label()) return l;
       for (const std::string& type : p.types) {
-        if (type != "PREF") {
-          std::string lower = type;
-          std::transform(lower.begin(), lower.end(), lower.begin(),
-                         [](char c) { return (c >= 'A' && c <= 'Z') ? static_cast<char>(c - 'A' + 'a') : c; });
-          return lower;
-        }
+        if (type.empty() || type == "PREF") continue;
+        std::string lower = type;
+        std::transform(lower.begin(), lower.end(), lower.begin(),
+                       [](char c) { return (c >= 'A' && c <= 'Z') ? static_cast<char>(c - 'A' + 'a') : c; });
+        return toUtf8(std::move(lower), {});  // parameters carry no charset of their own
       }
       return std::nullopt;
     };

@@ -3,6 +3,7 @@
 #include "platform/contacts/VCard.h"
 #include "platform/log/Log.h"
 #include "platform/phone/PhoneNumbers.h"
+#include "platform/text/StringEscapes.h"
 #include "platform/text/Unicode.h"
 
 #include <fcntl.h>
@@ -51,6 +52,13 @@ std::string phoneKey(std::string_view number, const std::string& region) {
   number = trim(number);
   if (auto canonical = formatPhoneNumber(number, region, PhoneNumberStyle::Canonical)) return *canonical;
   return std::string(number);
+}
+
+// The name that identifies a file in card identifiers: its path in the book, percent-escaped when
+// it is not UTF-8 (file names on Linux are bytes), so that identifiers are always text.
+std::string sourceNameOf(const fs::path& relative) {
+  std::string name = relative.generic_string();
+  return isValidUtf8(name) ? name : encodeToPercentEscape(name);
 }
 
 bool hasVCardExtension(const fs::path& path) {
@@ -204,7 +212,7 @@ struct VCardContactStore::Impl {
       return files;
     }
     if (!fs::is_directory(status)) {
-      files.emplace_back(path, path.filename().string());
+      files.emplace_back(path, sourceNameOf(path.filename()));
       return files;
     }
     fs::recursive_directory_iterator it(path, fs::directory_options::skip_permission_denied, ec);
@@ -219,7 +227,7 @@ struct VCardContactStore::Impl {
       }
       std::error_code typeError;
       if (!hasVCardExtension(it->path()) || it->is_directory(typeError)) continue;
-      files.emplace_back(it->path(), it->path().lexically_relative(path).generic_string());
+      files.emplace_back(it->path(), sourceNameOf(it->path().lexically_relative(path)));
     }
     std::sort(files.begin(), files.end(), [](const auto& a, const auto& b) { return a.second < b.second; });
     return files;

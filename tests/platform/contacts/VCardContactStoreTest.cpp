@@ -47,10 +47,11 @@ TEST_F(VCardContactStoreTest, AFolderIsReadRecursivelyInFileNameOrderAndAFileOnI
   book.write("a.VCF", card("FN:Ay\r\nEMAIL:shared@example.com\r\n") + card("FN:Ay Two\r\nEMAIL:shared@example.com\r\n"));
   book.write("sub/c.vcf", card("FN:Sea\r\nEMAIL:shared@example.com\r\n"));
   book.write("notes.txt", card("FN:Not A Contact\r\nEMAIL:shared@example.com\r\n"));
+  book.write("z\xE9.vcf", card("EMAIL:shared@example.com\r\n"));  // a file name that is no UTF-8
   VCardContactStore folder(book.path(), "us");
-  EXPECT_EQ(folder.load(), 4u);
+  EXPECT_EQ(folder.load(), 5u);
   EXPECT_EQ(identifiersOf(byEmail(folder, "shared@example.com")),
-            (std::vector<std::string>{"a.VCF#0", "a.VCF#1", "b.vcf#0", "sub/c.vcf#0"}));
+            (std::vector<std::string>{"a.VCF#0", "a.VCF#1", "b.vcf#0", "sub/c.vcf#0", "z%E9.vcf#0"}));
 
   VCardContactStore single(book.path() / "sub" / "c.vcf", "us");
   EXPECT_EQ(single.load(), 1u);

@@ -259,11 +259,13 @@ TEST(VCardProperties, TelUrisLoseTheSchemeAndKeepTheirExtension) {
   const Contact c = parseOne(card("TEL;VALUE=uri;TYPE=\"work,voice\";PREF=1:tel:+1-503-555-0104;ext=102\r\n"
                                   "TEL;VALUE=uri:TEL:+1-503-555-0105;phone-context=example.com\r\n"
                                   "TEL:tel:+1%20503%20555%200106\r\n"
+                                  "TEL:tel:+1-503-555-0108;ext=%E9\r\n"  // escapes that make no UTF-8
                                   "TEL: (503) 555-0107 \r\n",
                                   "4.0"));
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"},
                                      {std::nullopt, "+1-503-555-0105"},
                                      {std::nullopt, "+1 503 555 0106"},
+                                     {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
                                      {std::nullopt, "(503) 555-0107"}}));
 }
 
@@ -306,6 +308,7 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
       "ORG;CHARSET=UTF-8:Caf\xC3\xA9 \xFF\xC3 end\r\n"              // declared UTF-8: ill-formed parts marked
       "TITLE;CHARSET=x-no-such-charset:Se\xC3\xB1or\r\n"            // unknown charset: read as if none
       "X-MAIDENNAME;CHARSET=US-ASCII:Fran\xE7ois\r\n"               // a false US-ASCII: as if none
+      "X-SOCIALPROFILE;TYPE=\xE9t\xE9:https://example.com/p\r\n"      // a parameter is no UTF-8 either
       "NICKNAME;CHARSET=../../../etc/passwd:Pe\xF1" "a\r\n"         // never a file name for ICU
       "X-PHONETIC-FIRST-NAME;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:=C3=91=80\r\n",
       "2.1"));
@@ -316,6 +319,7 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
   EXPECT_EQ(c.organizationName, "Caf\xC3\xA9 \xEF\xBF\xBD\xEF\xBF\xBD end");
   EXPECT_EQ(c.jobTitle, "Se\xC3\xB1or");
   EXPECT_EQ(c.previousFamilyName, "Fran\xC3\xA7ois");
+  EXPECT_EQ(c.socialProfiles, (Labeled{{"\xC3\xA9t\xC3\xA9", "https://example.com/p"}}));
   EXPECT_EQ(c.nickname, "Pe\xC3\xB1" "a");
   EXPECT_EQ(c.phoneticGivenName, "\xC3\x91\xEF\xBF\xBD");
   EXPECT_TRUE(allTextIsUtf8(c));
