@@ -466,7 +466,8 @@ std::string phoneValue(const Property& property) {
       number += " ext. " + decodePercent(parameter.substr(4));
     }
   }
-  return toUtf8(std::move(number), {});  // escapes may have made bytes that are no UTF-8
+  // Escapes may have made bytes that are no UTF-8.
+  return std::string(trim(toUtf8(std::move(number), {})));
 }
 
 std::string emailValue(const Property& property) {
