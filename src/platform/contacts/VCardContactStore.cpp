@@ -208,7 +208,11 @@ struct VCardContactStore::Impl {
     std::error_code ec;
     const fs::file_status status = fs::status(path, ec);
     if (!fs::exists(status)) {
-      Log::shared().info("Contacts: no address book at %@", path.string());
+      if (ec && ec != std::errc::no_such_file_or_directory && ec != std::errc::not_a_directory) {
+        Log::shared().error("Contacts: the address book %@ cannot be read: %@", path.string(), ec.message());
+      } else {
+        Log::shared().info("Contacts: no address book at %@", path.string());
+      }
       return files;
     }
     if (!fs::is_directory(status)) {
