@@ -117,7 +117,7 @@ TEST_F(VCardContactStoreTest, PhoneNumbersMatchAsNumbersInTheStoresRegion) {
   EXPECT_EQ(identifiersOf(byPhone(us, "+1 408 555 0101")), (std::vector<std::string>{"ext"}));
   EXPECT_TRUE(byPhone(us, "(408) 555-0102").empty());
 
-  // In Germany "(408) 555-0100" is a German number and "040 555 0199" a Hamburg one.
+  // In Germany "(408) 555-0100" is a German number, and "040 555 0199" one of its local numbers.
   VCardContactStore de(book.path(), "de");
   EXPECT_TRUE(byPhone(de, "(408) 555-0100").empty());
   EXPECT_EQ(identifiersOf(byPhone(de, "+14085550100")), (std::vector<std::string>{"us"}));
