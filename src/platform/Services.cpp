@@ -39,7 +39,9 @@ Services::Services()
         return std::make_shared<AssistantPreferences>(language);
       }),
       locale([] { return std::make_shared<IcuLocaleInfo>(); }),
-      contactStore([]() -> std::shared_ptr<ContactStore> { return nullptr; }) {}
+      contactStore([this]() -> std::shared_ptr<ContactStore> {
+        return std::make_shared<VCardContactStore>(configuration()->contactsPath(), phoneRegionOfLocale(*locale.get()));
+      }) {}
 
 std::shared_ptr<const Configuration> Services::configuration() {
   std::lock_guard lock(configMutex_);

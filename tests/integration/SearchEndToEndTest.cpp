@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <fstream>
+#include <map>
 
 namespace kyn::itest {
 namespace {
@@ -75,7 +76,9 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
   Json locations = reply["kynLocations"];
   ASSERT_EQ(locations.size(), 2u);
-  EXPECT_EQ(locations[0]["friend"]["object"]["fullName"], "Ada Marlowe");
+  // Ada's handle is the one the assistant sent: its own person stands for her, as it was given.
+  EXPECT_EQ(locations[0]["friend"]["object"], Json::parse(R"({"class":"AXPerson",
+      "emails":[{"class":"AXEmail","emailAddress":"ada@example.com"}]})"));
   EXPECT_EQ(locations[0]["label"], "Work");
   EXPECT_EQ(locations[0]["latitude"], 45.5152);
   EXPECT_GT(locations[0].value("distance", 0.0), 0.0) << locations[0].dump();
@@ -93,6 +96,22 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   EXPECT_EQ(requests[0]["handles"], Json::parse(R"(["ada@example.com","+15035550102"])"));
   EXPECT_EQ(requests[0]["authorised"], true);
   EXPECT_EQ(requests[0]["apiVersion"], "4.0");
+}
+
+TEST_F(SearchEndToEnd, WithoutNamedFriendsEveryFriendComesBackNamedFromTheContacts) {
+  start();
+  const auto outcome = plugin->perform(searchFor({}));
+  ASSERT_EQ(outcome.replies, 1);
+  Json reply = outcome.reply.value_or(Json());
+  ASSERT_EQ(reply.value("class", ""), "AXKynSearchCompleted") << reply.dump();
+  std::map<std::string, std::string> names;
+  for (auto& location : reply["kynLocations"]) {
+    names[location["friend"]["data"].get<std::string>()] = location["friend"]["object"].value("fullName", "");
+  }
+  EXPECT_EQ(names, (std::map<std::string, std::string>{{"ada@example.com", "Ada Marlowe"},
+                                                        {"+15035550102", "Bram Tolliver"},
+                                                        {"chloe@example.org", ""}}));
+  EXPECT_TRUE(sim->requests().at(0)["handles"].empty());
 }
 
 TEST_F(SearchEndToEnd, APendingFriendMakesTheAnswerIncomplete) {

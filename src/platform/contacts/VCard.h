@@ -16,7 +16,8 @@ struct VCardParseResult {
 };
 
 /// Reads every card of a vCard text (versions 2.1, 3.0 and 4.0 as real exporters write them).
-/// A card without UID gets the identifier `sourceName` + "#" + its position in the text.
+/// A card without UID gets the identifier `sourceName` + "#" + its position in the text (counted from 0
+/// over every card, skipped ones included, so that the others keep their identifiers).
 [[nodiscard]] VCardParseResult parseVCards(std::string_view text, std::string_view sourceName);
 
 }  // namespace kyn::platform

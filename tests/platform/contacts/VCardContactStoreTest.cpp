@@ -1,0 +1,230 @@
+#include "platform/contacts/ContactStore.h"
+#include "support/PlatformTest.h"
+
+#include <algorithm>
+#include <atomic>
+#include <thread>
+
+namespace kyn::platform {
+namespace {
+
+using test::PlatformTest;
+using test::TempDir;
+using Contacts = std::vector<std::shared_ptr<const Contact>>;
+
+const ContactKeys kAllKeys = {std::string(ContactKey::FullNameFormatterKeys), std::string(ContactKey::PhoneNumbers),
+                              std::string(ContactKey::EmailAddresses), std::string(ContactKey::ImageData)};
+
+std::string card(std::string_view body) {
+  return "BEGIN:VCARD\r\nVERSION:3.0\r\n" + std::string(body) + "END:VCARD\r\n";
+}
+
+std::vector<std::string> identifiersOf(const Contacts& contacts) {
+  std::vector<std::string> ids;
+  for (const auto& c : contacts) ids.push_back(c->identifier);
+  return ids;
+}
+
+class VCardContactStoreTest : public PlatformTest {
+ protected:
+  Contacts byEmail(VCardContactStore& store, std::string_view email) {
+    return store.unifiedContactsMatchingEmailAddress(email, kAllKeys, nullptr);
+  }
+  Contacts byPhone(VCardContactStore& store, std::string_view phone) {
+    return store.unifiedContactsMatchingPhoneNumber(phone, kAllKeys, nullptr);
+  }
+  std::size_t logLinesContaining(std::string_view text) const {
+    const auto lines = logMessages();
+    return static_cast<std::size_t>(
+        std::count_if(lines.begin(), lines.end(), [&](const std::string& line) { return line.find(text) != std::string::npos; }));
+  }
+
+  TempDir book;
+};
+
+TEST_F(VCardContactStoreTest, AFolderIsReadRecursivelyInFileNameOrderAndAFileOnItsOwn) {
+  book.write("b.vcf", card("FN:Bee\r\nEMAIL:shared@example.com\r\n"));
+  book.write("a.VCF", card("FN:Ay\r\nEMAIL:shared@example.com\r\n") + card("FN:Ay Two\r\nEMAIL:shared@example.com\r\n"));
+  book.write("sub/c.vcf", card("FN:Sea\r\nEMAIL:shared@example.com\r\n"));
+  book.write("notes.txt", card("FN:Not A Contact\r\nEMAIL:shared@example.com\r\n"));
+  book.write("z\xE9.vcf", card("EMAIL:shared@example.com\r\n"));  // a file name that is no UTF-8
+  VCardContactStore folder(book.path(), "us");
+  EXPECT_EQ(folder.load(), 5u);
+  EXPECT_EQ(identifiersOf(byEmail(folder, "shared@example.com")),
+            (std::vector<std::string>{"a.VCF#0", "a.VCF#1", "b.vcf#0", "sub/c.vcf#0", "z%E9.vcf#0"}));
+
+  VCardContactStore single(book.path() / "sub" / "c.vcf", "us");
+  EXPECT_EQ(single.load(), 1u);
+  EXPECT_EQ(identifiersOf(byEmail(single, "shared@example.com")), (std::vector<std::string>{"c.vcf#0"}));
+}
+
+TEST_F(VCardContactStoreTest, AMissingBookIsEmptyWithOneInfoLine) {
+  VCardContactStore store(book.path() / "nowhere", "us");
+  EXPECT_EQ(store.load(), 0u);
+  EXPECT_TRUE(byEmail(store, "a@example.com").empty());
+  EXPECT_TRUE(byPhone(store, "+1 503 555 0100").empty());
+  EXPECT_FALSE(store.unifiedContactWithIdentifier("x", kAllKeys, nullptr));
+  EXPECT_EQ(logLinesContaining("no address book"), 1u);
+  EXPECT_TRUE(log->messages(LogLevel::Error).empty());
+}
+
+TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
+  const std::string photo = "PHOTO;ENCODING=b:/9j/4A==\r\n";
+  book.write("1.vcf", card("UID:u-1\r\nN:Example;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
+                           photo));
+  book.write("2.vcf", card("UID:other\r\nFN:Someone Else\r\n"));
+  book.write("3.vcf", card("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name\r\nTITLE:Pilot\r\n"
+                           "TEL;TYPE=CELL:+1 503 555 0110\r\nTEL;TYPE=HOME:+1 503 555 0110\r\nEMAIL:ann@example.org\r\n"
+                           "PHOTO;ENCODING=b:iVBORw==\r\n"));
+  VCardContactStore store(book.path(), "us");
+  EXPECT_EQ(store.load(), 2u);
+  const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "jobTitle",
+                                                              "phoneNumbers", "emailAddresses", "imageData"},
+                                                      nullptr);
+  ASSERT_TRUE(ann);
+  EXPECT_EQ(ann->familyName, "Example");  // the first card's value
+  EXPECT_EQ(ann->givenName, "Ann");
+  EXPECT_EQ(ann->jobTitle, "Pilot");  // only the later card has one
+  EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
+  EXPECT_EQ(ann->emailAddresses.size(), 2u);
+  ASSERT_TRUE(ann->imageData);
+  EXPECT_EQ(*ann->imageData, (std::vector<std::uint8_t>{0xFF, 0xD8, 0xFF, 0xE0}));
+  // Found by the later card's address as well, once.
+  EXPECT_EQ(identifiersOf(byEmail(store, "ann@example.org")), (std::vector<std::string>{"u-1"}));
+}
+
+TEST_F(VCardContactStoreTest, EmailAddressesMatchIgnoringCaseInAnyScript) {
+  book.write("a.vcf", card("UID:a\r\nEMAIL:Mixed.Case@Example.COM\r\nEMAIL: mixed.case@example.com \r\n") +
+                          card("UID:b\r\nEMAIL;CHARSET=UTF-8:J\xC3\x96RG@example.org\r\nEMAIL:Stra\xC3\x9F" "e@example.net\r\n") +
+                          card("UID:c\r\nEMAIL:mailto:MIXED.case@example.com\r\n"));
+  VCardContactStore store(book.path(), "us");
+  EXPECT_EQ(identifiersOf(byEmail(store, "mixed.case@example.com")), (std::vector<std::string>{"a", "c"}));
+  EXPECT_EQ(identifiersOf(byEmail(store, "MIXED.CASE@EXAMPLE.COM ")), (std::vector<std::string>{"a", "c"}));
+  EXPECT_EQ(identifiersOf(byEmail(store, "j\xC3\xB6rg@EXAMPLE.org")), (std::vector<std::string>{"b"}));
+  EXPECT_EQ(identifiersOf(byEmail(store, "STRASSE@example.net")), (std::vector<std::string>{"b"}));
+  EXPECT_TRUE(byEmail(store, "").empty());
+  EXPECT_TRUE(byEmail(store, "mixed.case@example").empty());
+}
+
+TEST_F(VCardContactStoreTest, PhoneNumbersMatchAsNumbersInTheStoresRegion) {
+  const std::string cards = card("UID:us\r\nTEL:+1 408-555-0100\r\n") + card("UID:local\r\nTEL:040 555 0199\r\n") +
+                            card("UID:ext\r\nTEL;VALUE=uri:tel:+1-408-555-0101;ext=7\r\n");
+  book.write("a.vcf", cards);
+  VCardContactStore us(book.path(), "us");
+  for (const char* written : {"(408) 555-0100", "+14085550100", "408.555.0100", "1 408 555 0100"}) {
+    EXPECT_EQ(identifiersOf(byPhone(us, written)), (std::vector<std::string>{"us"})) << written;
+  }
+  EXPECT_EQ(identifiersOf(byPhone(us, "+1 408 555 0101")), (std::vector<std::string>{"ext"}));
+  EXPECT_TRUE(byPhone(us, "(408) 555-0102").empty());
+
+  // In Germany "(408) 555-0100" is a German number, and "040 555 0199" one of its local numbers.
+  VCardContactStore de(book.path(), "de");
+  EXPECT_TRUE(byPhone(de, "(408) 555-0100").empty());
+  EXPECT_EQ(identifiersOf(byPhone(de, "+14085550100")), (std::vector<std::string>{"us"}));
+  EXPECT_EQ(identifiersOf(byPhone(de, "+49 40 5550199")), (std::vector<std::string>{"local"}));
+  EXPECT_TRUE(byPhone(us, "+49 40 5550199").empty());
+}
+
+TEST_F(VCardContactStoreTest, TextsThatAreNoPhoneNumbersMatchThemselves) {
+  book.write("a.vcf", card("UID:p\r\nTEL;WORK:BusinessPhone\r\nTEL;HOME: HomePhone\r\n") +
+                          card("UID:q\r\nTEL:MobilePhone\r\n"));
+  VCardContactStore store(book.path(), "us");
+  EXPECT_EQ(identifiersOf(byPhone(store, "BusinessPhone")), (std::vector<std::string>{"p"}));
+  EXPECT_EQ(identifiersOf(byPhone(store, "HomePhone ")), (std::vector<std::string>{"p"}));
+  EXPECT_EQ(identifiersOf(byPhone(store, "MobilePhone")), (std::vector<std::string>{"q"}));
+  EXPECT_TRUE(byPhone(store, "OtherPhone").empty());
+  EXPECT_TRUE(byPhone(store, "").empty());
+}
+
+TEST_F(VCardContactStoreTest, LookUpsReturnOnlyTheRequestedKeys) {
+  book.write("a.vcf", card("UID:id-1\r\nFN:Zoe Sample\r\nN:Sample;Zoe\r\nORG:Sample Works\r\nNOTE:private\r\n"
+                           "EMAIL:zoe@example.com\r\nTEL:+1 503 555 0120\r\n"));
+  VCardContactStore store(book.path(), "us");
+
+  std::string error;
+  const auto named = store.unifiedContactWithIdentifier("id-1", {std::string(ContactKey::GivenName)}, &error);
+  ASSERT_TRUE(named);
+  EXPECT_EQ(named->identifier, "id-1");
+  EXPECT_EQ(named->givenName, "Zoe");
+  EXPECT_FALSE(named->familyName);
+  EXPECT_TRUE(named->emailAddresses.empty());
+  EXPECT_TRUE(error.empty());
+
+  const auto formatted = store.unifiedContactsMatchingEmailAddress(
+      "zoe@example.com", {std::string(ContactKey::FullNameFormatterKeys), "noSuchKey"}, &error);
+  ASSERT_EQ(formatted.size(), 1u);
+  EXPECT_EQ(fullNameOfContact(*formatted[0], "en_US"), "Zoe Sample");
+  EXPECT_FALSE(formatted[0]->note);
+  EXPECT_NE(error.find("noSuchKey"), std::string::npos);  // reported, and still answered
+
+  error.clear();
+  EXPECT_EQ(store.unifiedContactsMatchingPhoneNumber("+15035550120", {"bogus"}, &error).size(), 1u);
+  EXPECT_NE(error.find("bogus"), std::string::npos);
+  EXPECT_FALSE(store.unifiedContactWithIdentifier("id-2", kAllKeys, nullptr));
+  EXPECT_FALSE(store.unifiedContactWithIdentifier("", kAllKeys, nullptr));
+}
+
+TEST_F(VCardContactStoreTest, BadFilesAndCardsAreLoggedOnceAndTheRestStillWorks) {
+  book.write("good.vcf", card("UID:g\r\nEMAIL:good@example.com\r\n") + "BEGIN:VCARD\r\nFN:Secret Name\r\n");
+  const auto big = book.write("big.vcf", "");
+  std::filesystem::resize_file(big, (std::uint64_t{64} << 20) + 1);  // sparse: costs no disk
+  std::filesystem::create_symlink(book.path() / "gone", book.path() / "dangling.vcf");
+  VCardContactStore store(book.path(), "us");
+  EXPECT_EQ(store.load(), 1u);
+  EXPECT_EQ(identifiersOf(byEmail(store, "good@example.com")), (std::vector<std::string>{"g"}));
+  EXPECT_EQ(store.load(), 1u);  // loads once
+
+  const auto errors = log->messages(LogLevel::Error);
+  ASSERT_EQ(errors.size(), 3u);
+  EXPECT_EQ(logLinesContaining("big.vcf: larger than 64 MiB"), 1u);
+  EXPECT_EQ(logLinesContaining("dangling.vcf: No such file or directory"), 1u);
+  EXPECT_EQ(logLinesContaining("good.vcf: the card that begins on line 6 has no END:VCARD"), 1u);
+  EXPECT_EQ(logLinesContaining("Secret"), 0u);  // card contents never reach the log
+}
+
+TEST_F(VCardContactStoreTest, ConcurrentFirstLookUpsAllSeeTheLoadedBook) {
+  std::string cards;
+  for (int i = 0; i < 300; ++i) {
+    char phone[32];
+    std::snprintf(phone, sizeof phone, "+1 503 555 %04d", i);
+    cards += card("UID:c" + std::to_string(i) + "\r\nEMAIL:p" + std::to_string(i) + "@example.com\r\nTEL:" + phone + "\r\n");
+  }
+  book.write("many.vcf", cards);
+  VCardContactStore store(book.path(), "us");
+  std::atomic<int> failures{0};
+  std::atomic<bool> go{false};
+  std::vector<std::thread> threads;
+  for (int t = 0; t < 8; ++t) {
+    threads.emplace_back([&, t] {
+      while (!go.load()) std::this_thread::yield();
+      for (int i = t; i < 300; i += 8) {
+        char phone[32];
+        std::snprintf(phone, sizeof phone, "(503) 555-%04d", i);
+        const std::string id = "c" + std::to_string(i);
+        const bool ok = identifiersOf(byPhone(store, phone)) == std::vector<std::string>{id} &&
+                        identifiersOf(byEmail(store, "P" + std::to_string(i) + "@example.com")) ==
+                            std::vector<std::string>{id} &&
+                        store.unifiedContactWithIdentifier(id, kAllKeys, nullptr) != nullptr;
+        if (!ok) ++failures;
+      }
+    });
+  }
+  go = true;
+  for (auto& thread : threads) thread.join();
+  EXPECT_EQ(failures.load(), 0);
+  EXPECT_EQ(logLinesContaining("300 contacts, 1 files"), 1u);
+}
+
+TEST_F(VCardContactStoreTest, TheServicesBuildTheStoreFromTheConfiguredFolder) {
+  // The configured default: "contacts" in the configuration folder.
+  configDir->write("contacts/friend.vcf", card("UID:f\r\nTEL:0171 5550123\r\n"));
+  auto& services = platform::services();
+  services.locale.set(std::make_shared<IcuLocaleInfo>("de_DE"));
+  const auto store = services.contactStore.get();
+  ASSERT_TRUE(store);
+  const auto found = store->unifiedContactsMatchingPhoneNumber("+49 171 5550123", kAllKeys, nullptr);
+  EXPECT_EQ(identifiersOf(found), (std::vector<std::string>{"f"}));
+}
+
+}  // namespace
+}  // namespace kyn::platform

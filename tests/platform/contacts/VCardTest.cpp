@@ -1,0 +1,419 @@
+#include "platform/contacts/VCard.h"
+#include "platform/text/StringEscapes.h"
+
+#include <gtest/gtest.h>
+
+#include <random>
+
+namespace kyn::platform {
+namespace {
+
+using Labeled = std::vector<LabeledValue>;
+
+// The one contact of `text`; fails the test when there is not exactly one or a card was skipped.
+Contact parseOne(std::string_view text) {
+  const VCardParseResult result = parseVCards(text, "book.vcf");
+  EXPECT_EQ(result.contacts.size(), 1u) << text;
+  EXPECT_TRUE(result.skipped.empty()) << (result.skipped.empty() ? "" : result.skipped.front());
+  return result.contacts.empty() ? Contact{} : result.contacts.front();
+}
+
+std::string card(std::string_view body, std::string_view version = "3.0") {
+  return "BEGIN:VCARD\r\nVERSION:" + std::string(version) + "\r\n" + std::string(body) + "END:VCARD\r\n";
+}
+
+std::string base64(const std::vector<std::uint8_t>& bytes) {
+  static constexpr char kAlphabet[] = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
+  std::string out;
+  for (std::size_t i = 0; i < bytes.size(); i += 3) {
+    const std::uint32_t n = (std::uint32_t{bytes[i]} << 16) | (i + 1 < bytes.size() ? bytes[i + 1] << 8 : 0) |
+                            (i + 2 < bytes.size() ? bytes[i + 2] : 0);
+    out += kAlphabet[(n >> 18) & 63];
+    out += kAlphabet[(n >> 12) & 63];
+    out += i + 1 < bytes.size() ? kAlphabet[(n >> 6) & 63] : '=';
+    out += i + 2 < bytes.size() ? kAlphabet[n & 63] : '=';
+  }
+  return out;
+}
+
+std::vector<std::uint8_t> bytesOf(const ImageBytes& image) { return image ? *image : std::vector<std::uint8_t>{}; }
+
+const std::vector<std::uint8_t> kPicture = {0xFF, 0xD8, 0xFF, 0xE0, 0x00, 0x10, 'J', 'F', 'I', 'F', 0x00, 0xFB, 0xFF, 0xD9};
+
+bool allTextIsUtf8(const Contact& c) {
+  for (const auto* s : {&c.namePrefix, &c.givenName, &c.middleName, &c.familyName, &c.nameSuffix, &c.nickname,
+                        &c.organizationName, &c.departmentName, &c.jobTitle, &c.note, &c.formattedName}) {
+    if (*s && !isValidUtf8(**s)) return false;
+  }
+  for (const auto* list : {&c.phoneNumbers, &c.emailAddresses, &c.postalAddresses, &c.urlAddresses}) {
+    for (const auto& v : *list) {
+      if (!isValidUtf8(v.value) || (v.label && !isValidUtf8(*v.label))) return false;
+    }
+  }
+  return isValidUtf8(c.identifier);
+}
+
+// --- Lines and cards -----------------------------------------------------------------------------
+
+TEST(VCardLines, AnyLineEndingAndFoldsWithSpaceOrTabJoinTheirLine) {
+  const Contact c = parseOne("BEGIN:VCARD\nVERSION:3.0\r\nFN:Ada\r\n  Lovelace\rNOTE:one\n\ttwo\r\n three\r"
+                             "EMAIL:ada@exam\r\n ple.com\nEND:VCARD");
+  EXPECT_EQ(c.formattedName, "Ada Lovelace");  // the break and one blank go, the second blank stays
+  EXPECT_EQ(c.note, "onetwothree");
+  ASSERT_EQ(c.emailAddresses.size(), 1u);
+  EXPECT_EQ(c.emailAddresses[0].value, "ada@example.com");
+}
+
+TEST(VCardLines, FoldsInOddPlaces) {
+  // Inside a parameter, inside the property name, and a continuation right after BEGIN, which has
+  // nothing to continue and so stands as a line of its own.
+  const Contact c = parseOne("BEGIN:VCARD\r\n FN:Grace Hopper\r\nTEL;TY\r\n PE=CE\r\n LL:+1 503 555 0101\r\n"
+                             "EMA\r\n IL:g@example.org\r\nEND:VCARD\r\n");
+  EXPECT_EQ(c.formattedName, "Grace Hopper");
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"mobile", "+1 503 555 0101"}}));
+  EXPECT_EQ(c.emailAddresses, (Labeled{{std::nullopt, "g@example.org"}}));
+}
+
+TEST(VCardLines, BeginAndEndIgnoreCaseAndJunkBetweenCardsIsIgnored) {
+  const auto result = parseVCards(
+      "garbage before\r\nFN:Not In A Card\r\nbegin:vCard\r\nFN:One\r\nEnd:VCard\r\n\r\n-- junk --\r\n"
+      "  BEGIN:VCARD  \r\nFN:Two\r\n\tEND:VCARD\r\ntrailing junk",  // indented, yet no fold
+      "mixed.vcf");
+  ASSERT_EQ(result.contacts.size(), 2u);
+  EXPECT_EQ(result.contacts[0].formattedName, "One");
+  EXPECT_EQ(result.contacts[1].formattedName, "Two");
+  EXPECT_TRUE(result.skipped.empty());
+}
+
+TEST(VCardLines, EmptyAndJunkTextsHoldNoCards) {
+  for (std::string_view text : {std::string_view(""), std::string_view("\r\n\r\n"), std::string_view("END:VCARD\r\n"),
+                                 std::string_view("hello\0world", 11)}) {
+    const auto result = parseVCards(text, "x.vcf");
+    EXPECT_TRUE(result.contacts.empty());
+    EXPECT_TRUE(result.skipped.empty());
+  }
+  // A card with nothing in it is still a card.
+  const auto empty = parseVCards("BEGIN:VCARD\r\nEND:VCARD\r\n", "x.vcf");
+  ASSERT_EQ(empty.contacts.size(), 1u);
+  EXPECT_EQ(empty.contacts[0].identifier, "x.vcf#0");
+}
+
+TEST(VCardLines, CutOffCardsAreReportedAndTheCardsAroundThemRead) {
+  const auto result = parseVCards(
+      "BEGIN:VCARD\nFN:First\nEND:VCARD\n"
+      "BEGIN:VCARD\nFN:Cut Off\nEMAIL:cut@example.com\n"  // no END: the next BEGIN shows it was cut off
+      "BEGIN:VCARD\nFN:Third\nEND:VCARD\n"
+      "BEGIN:VCARD\nFN:Last Without End\n",
+      "cut.vcf");
+  ASSERT_EQ(result.contacts.size(), 2u);
+  EXPECT_EQ(result.contacts[0].formattedName, "First");
+  EXPECT_EQ(result.contacts[1].formattedName, "Third");
+  EXPECT_EQ(result.contacts[1].identifier, "cut.vcf#2");  // positions count the skipped card too
+  ASSERT_EQ(result.skipped.size(), 2u);
+  EXPECT_EQ(result.skipped[0], "cut.vcf: the card that begins on line 4 has no END:VCARD");
+  EXPECT_EQ(result.skipped[1], "cut.vcf: the card that begins on line 10 has no END:VCARD");
+  EXPECT_EQ(result.skipped[1].find("Last"), std::string::npos);  // reports never carry card contents
+}
+
+TEST(VCardLines, AnEmbeddedAgentCardIsSkippedUpToItsEnd) {
+  const Contact c = parseOne(card("FN:Boss\r\nAGENT:\r\nBEGIN:VCARD\r\nVERSION:2.1\r\nFN:Assistant\r\n"
+                                  "TEL:+1 503 555 0102\r\nEND:VCARD\r\nTEL:+1 503 555 0103\r\n",
+                                  "2.1"));
+  EXPECT_EQ(c.formattedName, "Boss");
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{std::nullopt, "+1 503 555 0103"}}));
+  const Contact sameLine = parseOne(card("FN:Boss\r\nAGENT:BEGIN:VCARD\r\nFN:Assistant\r\nEND:VCARD\r\nNOTE:after\r\n"));
+  EXPECT_EQ(sameLine.formattedName, "Boss");
+  EXPECT_EQ(sameLine.note, "after");
+}
+
+TEST(VCardLines, CardsWithoutUidAreNamedByTheirSourceAndPosition) {
+  const auto result = parseVCards(card("FN:A\r\n") + card("UID:urn:uuid:5F1C\\,x \r\nFN:B\r\n") + card("FN:A\r\n") +
+                                      card("UID:same\r\nFN:C\r\n") + card("UID:same\r\nFN:D\r\n") + card("UID:\r\n"),
+                                  "friends/list.vcf");
+  ASSERT_EQ(result.contacts.size(), 6u);
+  EXPECT_EQ(result.contacts[0].identifier, "friends/list.vcf#0");
+  EXPECT_EQ(result.contacts[1].identifier, "urn:uuid:5F1C\\,x");  // as written, blanks around it trimmed
+  EXPECT_EQ(result.contacts[2].identifier, "friends/list.vcf#2");
+  // Same identifiers stay separate cards here; the store unifies them.
+  EXPECT_EQ(result.contacts[3].identifier, "same");
+  EXPECT_EQ(result.contacts[4].identifier, "same");
+  EXPECT_EQ(result.contacts[5].identifier, "friends/list.vcf#5");
+}
+
+// --- Properties, parameters, escapes -----------------------------------------------------------
+
+TEST(VCardProperties, ParametersInEveryFormExportersWrite) {
+  const Contact c = parseOne(card(
+      "tel;type=home,work:1\r\n"                  // lower case, a list
+      "TEL;TYPE=WORK;TYPE=FAX:2\r\n"              // repeated TYPE
+      "TEL;CELL;PREF:3\r\n"                       // 2.1 bare parameters
+      "TEL;TYPE=\"work,voice\";PREF=1:4\r\n"      // a quoted list
+      "TEL;X-X=\"a;b:c\";TYPE=PAGER:5\r\n"        // ';' and ':' inside quotes
+      "TEL;X-BROKEN=\"never closed;TYPE=HOME:6\r\n"  // an unclosed quote does not hide the value
+      "item1.TEL:7\r\n"
+      "EMAIL;INTERNET;PREF:a@example.com\r\n"
+      "ITEM1.x-ablabel:Cabin\r\n"));
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home", "1"},
+                                     {"work fax", "2"},
+                                     {"mobile", "3"},
+                                     {"work", "4"},
+                                     {"pager", "5"},
+                                     {std::nullopt, "6"},
+                                     {"Cabin", "7"}}));
+  EXPECT_EQ(c.emailAddresses, (Labeled{{std::nullopt, "a@example.com"}}));
+}
+
+TEST(VCardProperties, LabelsFromTypesAndFromGroupLabels) {
+  const Contact c = parseOne(card(
+      "TEL;TYPE=HOME;TYPE=FAX:1\r\nTEL;TYPE=FAX:2\r\nTEL;TYPE=MAIN:3\r\nTEL;TYPE=OTHER:4\r\n"
+      "TEL;TYPE=VOICE,MSG,X400:5\r\nTEL;TYPE=CELL,WORK:6\r\n"
+      "item2.X-ABDATE:2001-06-02\r\nitem2.X-ABLabel:_$!<Anniversary>!$_\r\n"
+      "item3.X-ABLabel:My Label\r\nitem3.URL:https://example.org\r\n"  // the label may come first
+      "item4.URL;TYPE=HOME:https://example.net\r\n"));                 // a group without label
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home fax", "1"},
+                                     {"fax", "2"},
+                                     {"main", "3"},
+                                     {"other", "4"},
+                                     {std::nullopt, "5"},
+                                     {"mobile", "6"}}));
+  EXPECT_EQ(c.dates, (Labeled{{"Anniversary", "2001-06-02"}}));
+  EXPECT_EQ(c.urlAddresses, (Labeled{{"My Label", "https://example.org"}, {"home", "https://example.net"}}));
+}
+
+TEST(VCardProperties, EscapesAndStructuredValues) {
+  const Contact c = parseOne(card(
+      "N:O\\;Neil;Mary,Ann;Jo\\,Beth;Dr.;Jr.,PhD\r\n"
+      "NOTE:a\\nb\\Nc\\,d\\;e\\\\f\\\"g\\:h\\\r\n"
+      "URL:http\\://example.com/a\\,b\r\n"
+      "ORG:Acme\\; Sons;Research;Lab 2\r\n"
+      "ADR;TYPE=HOME:PO 7;Apt 3;12 Elm St\\nBack door;Springfield;OR;97400;Testland\r\n"
+      "ADR:;;;Lakeview;;;\r\n"
+      "ADR:;;;;;;\r\n"));
+  EXPECT_EQ(c.familyName, "O;Neil");
+  EXPECT_EQ(c.givenName, "Mary Ann");  // list items joined with a space
+  EXPECT_EQ(c.middleName, "Jo,Beth");  // an escaped comma is no separator
+  EXPECT_EQ(c.namePrefix, "Dr.");
+  EXPECT_EQ(c.nameSuffix, "Jr. PhD");
+  EXPECT_EQ(c.note, "a\nb\nc,d;e\\f\"g:h\\");  // a last lone backslash stays
+  EXPECT_EQ(c.urlAddresses, (Labeled{{std::nullopt, "http://example.com/a,b"}}));
+  EXPECT_EQ(c.organizationName, "Acme; Sons");
+  EXPECT_EQ(c.departmentName, "Research, Lab 2");
+  // Address components in label order; empty ones leave no blank lines; an empty address is none.
+  EXPECT_EQ(c.postalAddresses, (Labeled{{"home", "PO 7\nApt 3\n12 Elm St\nBack door\nSpringfield, OR 97400\nTestland"},
+                                        {std::nullopt, "Lakeview"}}));
+}
+
+TEST(VCardProperties, EveryFieldOfAContact) {
+  const Contact c = parseOne(card(
+      "FN:Dr. Alice Q. Example\r\nN:Example;Alice;Quinn;Dr.;\r\nNICKNAME:Al\r\nX-MAIDENNAME:Sample\r\n"
+      "X-PHONETIC-FIRST-NAME:A-lis\r\nX-PHONETIC-MIDDLE-NAME:Kwin\r\nX-PHONETIC-LAST-NAME:Ex-am-pel\r\n"
+      "TITLE:Surveyor\r\nBDAY:1985-04-12\r\nNOTE:Met at the lake.\r\nUID:alice-1\r\n"
+      "EMAIL;TYPE=WORK:alice@example.com\r\nEMAIL:mailto:alice@example.org\r\n"
+      "ANNIVERSARY:2010-05-01\r\nX-ANNIVERSARY:2011-05-01\r\n"
+      "RELATED;TYPE=spouse:urn:uuid:1234\r\nX-ABRELATEDNAMES:Bob\r\nX-SPOUSE:Carol\r\n"
+      "IMPP;TYPE=home:xmpp:alice@example.com\r\nX-AIM:alice.aim\r\nX-JABBER:alice@example.net\r\n"
+      "X-ICQ:12345\r\nX-MS-IMADDRESS:alice@example.org\r\n"
+      "X-SOCIALPROFILE;TYPE=chirper:https://social.example.com/alice\r\n"
+      "X-UNKNOWN:ignored\r\nCATEGORIES:a,b\r\n"));
+  EXPECT_EQ(c.identifier, "alice-1");
+  EXPECT_EQ(c.contactType, ContactType::Person);
+  EXPECT_EQ(c.formattedName, "Dr. Alice Q. Example");
+  EXPECT_EQ(c.middleName, "Quinn");
+  EXPECT_FALSE(c.nameSuffix);  // empty components stay absent
+  EXPECT_EQ(c.nickname, "Al");
+  EXPECT_EQ(c.previousFamilyName, "Sample");
+  EXPECT_EQ(c.phoneticGivenName, "A-lis");
+  EXPECT_EQ(c.phoneticMiddleName, "Kwin");
+  EXPECT_EQ(c.phoneticFamilyName, "Ex-am-pel");
+  EXPECT_EQ(c.jobTitle, "Surveyor");
+  EXPECT_EQ(c.birthday, "1985-04-12");
+  EXPECT_EQ(c.note, "Met at the lake.");
+  EXPECT_EQ(c.emailAddresses, (Labeled{{"work", "alice@example.com"}, {std::nullopt, "alice@example.org"}}));
+  EXPECT_EQ(c.dates, (Labeled{{"anniversary", "2010-05-01"}, {"anniversary", "2011-05-01"}}));
+  EXPECT_EQ(c.relations, (Labeled{{"spouse", "urn:uuid:1234"}, {std::nullopt, "Bob"}, {"spouse", "Carol"}}));
+  EXPECT_EQ(c.instantMessageAddresses, (Labeled{{"home", "xmpp:alice@example.com"},
+                                                {std::nullopt, "alice.aim"},
+                                                {std::nullopt, "alice@example.net"},
+                                                {std::nullopt, "12345"},
+                                                {std::nullopt, "alice@example.org"}}));
+  EXPECT_EQ(c.socialProfiles, (Labeled{{"chirper", "https://social.example.com/alice"}}));
+  EXPECT_FALSE(c.imageData);
+}
+
+TEST(VCardProperties, FirstValueOfASingleValuedFieldWins) {
+  const Contact c = parseOne(card("FN:First\r\nFN:Second\r\nN:One;Given\r\nN:Two;Other\r\nORG:A\r\nORG:B;Dept\r\n"));
+  EXPECT_EQ(c.formattedName, "First");
+  EXPECT_EQ(c.familyName, "One");
+  EXPECT_EQ(c.givenName, "Given");
+  EXPECT_EQ(c.organizationName, "A");
+  EXPECT_FALSE(c.departmentName);
+}
+
+TEST(VCardProperties, OrganisationsByKindOrShowAs) {
+  EXPECT_EQ(parseOne(card("KIND:org\r\nFN:Example Inc.\r\n", "4.0")).contactType, ContactType::Organization);
+  EXPECT_EQ(parseOne(card("X-ABShowAs:COMPANY\r\nORG:Example Inc.\r\n")).contactType, ContactType::Organization);
+  EXPECT_EQ(parseOne(card("KIND:individual\r\n", "4.0")).contactType, ContactType::Person);
+}
+
+TEST(VCardProperties, TelUrisLoseTheSchemeAndKeepTheirExtension) {
+  const Contact c = parseOne(card("TEL;VALUE=uri;TYPE=\"work,voice\";PREF=1:tel:+1-503-555-0104;ext=102\r\n"
+                                  "TEL;VALUE=uri:TEL:+1-503-555-0105;phone-context=example.com\r\n"
+                                  "TEL:tel:+1%20503%20555%200106\r\n"
+                                  "TEL:tel:+1-503-555-0108;ext=%E9\r\n"  // escapes that make no UTF-8
+                                  "TEL: (503) 555-0107 \r\n",
+                                  "4.0"));
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"},
+                                     {std::nullopt, "+1-503-555-0105"},
+                                     {std::nullopt, "+1 503 555 0106"},
+                                     {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
+                                     {std::nullopt, "(503) 555-0107"}}));
+}
+
+// --- Encodings and character sets --------------------------------------------------------------
+
+TEST(VCardEncodings, QuotedPrintableWithSoftBreaksAndFolds) {
+  const Contact c = parseOne(card(
+      "NOTE;ENCODING=QUOTED-PRINTABLE:Line one=0D=0ALine=\r\n two =3D done=\r\n"  // soft break keeps the blank
+      "=0D=0Athird\r\n"
+      "FN;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:Ren=C3=\r\n"  // a soft break inside a character
+      "=A9e=20Dupont\r\n"
+      "N;QUOTED-PRINTABLE;CHARSET=UTF-8:M=C3=BC=\r\n"  // a fold inside an escape (bare encoding)
+      " 6Cler;Jos=C3=A9\r\n"
+      "TITLE;ENCODING=QUOTED-PRINTABLE:Ends with soft break=\r\n"
+      "\r\n"
+      "ORG;ENCODING=QUOTED-PRINTABLE:Bad =ZZ escape=4\r\n",
+      "2.1"));
+  EXPECT_EQ(c.note, "Line one\nLine two = done\nthird");
+  EXPECT_EQ(c.formattedName, "Ren\xC3\xA9" "e Dupont");
+  EXPECT_EQ(c.familyName, "M\xC3\xBCller");
+  EXPECT_EQ(c.givenName, "Jos\xC3\xA9");
+  EXPECT_EQ(c.jobTitle, "Ends with soft break");
+  EXPECT_EQ(c.organizationName, "Bad =ZZ escape=4");  // broken escapes stay as written
+}
+
+TEST(VCardEncodings, AQuotedPrintableValueNeverSwallowsTheCardEnd) {
+  const auto result = parseVCards("BEGIN:VCARD\r\nNOTE;ENCODING=QUOTED-PRINTABLE:dangling=\r\nEND:VCARD\r\n"
+                                  "BEGIN:VCARD\r\nFN:Next\r\nEND:VCARD\r\n",
+                                  "qp.vcf");
+  ASSERT_EQ(result.contacts.size(), 2u);
+  EXPECT_EQ(result.contacts[0].note, "dangling");
+  EXPECT_EQ(result.contacts[1].formattedName, "Next");
+}
+
+TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
+  const Contact c = parseOne(card(
+      "FN;CHARSET=ISO-8859-1:Jos\xE9 Garc\xED" "a\r\n"
+      "NOTE;CHARSET=Shift_JIS:\x93\xFA\x96\x7B\r\n"                 // "Japan" in Shift_JIS
+      "N:\x93Quoted\x94;Ren\xE9\r\n"                                // no charset, no UTF-8: windows-1252
+      "ORG;CHARSET=UTF-8:Caf\xC3\xA9 \xFF\xC3 end\r\n"              // declared UTF-8: ill-formed parts marked
+      "TITLE;CHARSET=x-no-such-charset:Se\xC3\xB1or\r\n"            // unknown charset: read as if none
+      "X-MAIDENNAME;CHARSET=US-ASCII:Fran\xE7ois\r\n"               // a false US-ASCII: as if none
+      "X-SOCIALPROFILE;TYPE=\xE9t\xE9:https://example.com/p\r\n"      // a parameter is no UTF-8 either
+      "NICKNAME;CHARSET=../../../etc/passwd:Pe\xF1" "a\r\n"         // never a file name for ICU
+      "X-PHONETIC-FIRST-NAME;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:=C3=91=80\r\n",
+      "2.1"));
+  EXPECT_EQ(c.formattedName, "Jos\xC3\xA9 Garc\xC3\xAD" "a");
+  EXPECT_EQ(c.note, "\xE6\x97\xA5\xE6\x9C\xAC");
+  EXPECT_EQ(c.familyName, "\xE2\x80\x9CQuoted\xE2\x80\x9D");
+  EXPECT_EQ(c.givenName, "Ren\xC3\xA9");
+  EXPECT_EQ(c.organizationName, "Caf\xC3\xA9 \xEF\xBF\xBD\xEF\xBF\xBD end");
+  EXPECT_EQ(c.jobTitle, "Se\xC3\xB1or");
+  EXPECT_EQ(c.previousFamilyName, "Fran\xC3\xA7ois");
+  EXPECT_EQ(c.socialProfiles, (Labeled{{"\xC3\xA9t\xC3\xA9", "https://example.com/p"}}));
+  EXPECT_EQ(c.nickname, "Pe\xC3\xB1" "a");
+  EXPECT_EQ(c.phoneticGivenName, "\xC3\x91\xEF\xBF\xBD");
+  EXPECT_TRUE(allTextIsUtf8(c));
+}
+
+// --- Pictures ----------------------------------------------------------------------------------
+
+TEST(VCardPictures, Base64InEveryLayout) {
+  const std::string data = base64(kPicture);
+  const std::string folded = data.substr(0, 5) + "\r\n    " + data.substr(5, 6) + "\r\n\t" + data.substr(11);
+  // 3.0 folded with any indentation.
+  EXPECT_EQ(bytesOf(parseOne(card("PHOTO;ENCODING=b;TYPE=JPEG:" + folded + "\r\n")).imageData), kPicture);
+  // 2.1: lines without indentation up to a blank line, then more properties.
+  const Contact old = parseOne(card("PHOTO;ENCODING=BASE64;JPEG:\r\n" + data.substr(0, 8) + "\r\n" + data.substr(8) +
+                                        "\r\n\r\nFN:After Photo\r\n",
+                                    "2.1"));
+  EXPECT_EQ(bytesOf(old.imageData), kPicture);
+  EXPECT_EQ(old.formattedName, "After Photo");
+  // 4.0 data: URI, and a writer that left the encoding out.
+  EXPECT_EQ(bytesOf(parseOne(card("PHOTO:data:image/jpeg;base64," + folded + "\r\n", "4.0")).imageData), kPicture);
+  EXPECT_EQ(bytesOf(parseOne(card("PHOTO;TYPE=JPEG:" + data + "\r\n")).imageData), kPicture);
+}
+
+TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
+  const std::vector<std::uint8_t> other = {1, 2, 3};
+  const Contact c = parseOne(card("PHOTO;VALUE=uri:https://example.com/remote.jpg\r\n"  // never fetched
+                                  "PHOTO:https://example.com/also-remote.jpg\r\n"
+                                  "PHOTO;ENCODING=b;TYPE=THUMBNAIL:" + base64(other) + "\r\n"
+                                  "PHOTO;ENCODING=b:" + base64(kPicture) + "\r\n"
+                                  "PHOTO;ENCODING=b:" + base64(other) + "\r\n"));
+  EXPECT_EQ(bytesOf(c.imageData), kPicture);
+  EXPECT_EQ(bytesOf(c.thumbnailImageData), other);
+  // A thumbnail alone leaves the full picture empty; empty or undecodable data gives no picture.
+  EXPECT_FALSE(parseOne(card("PHOTO;TYPE=thumbnail;ENCODING=b:" + base64(other) + "\r\n")).imageData);
+  EXPECT_FALSE(parseOne(card("PHOTO;ENCODING=b:\r\nPHOTO:data:image/png;base64,\r\nPHOTO:data:nocomma\r\n")).imageData);
+}
+
+TEST(VCardPictures, ATenMegabytePhotoIsRead) {
+  std::vector<std::uint8_t> big(10u << 20);
+  std::mt19937 random(7);
+  for (auto& b : big) b = static_cast<std::uint8_t>(random());
+  std::string encoded = base64(big);
+  std::string folded;
+  folded.reserve(encoded.size() * 78 / 76 + 16);
+  for (std::size_t i = 0; i < encoded.size(); i += 76) folded += encoded.substr(i, 76) + "\r\n ";
+  const Contact c = parseOne(card("FN:Big Picture\r\nPHOTO;ENCODING=b:" + folded + "\r\nEMAIL:big@example.com\r\n"));
+  EXPECT_EQ(bytesOf(c.imageData), big);
+  EXPECT_EQ(c.emailAddresses.size(), 1u);
+}
+
+// --- Size and bad input ------------------------------------------------------------------------
+
+TEST(VCardBadInput, AHundredThousandLineFileIsReadWhole) {
+  std::string text;
+  for (int i = 0; i < 20'000; ++i) {
+    text += "BEGIN:VCARD\nFN:Person " + std::to_string(i) + "\nEMAIL:p" + std::to_string(i) +
+            "@example.com\nTEL:+1 503 555 0100\nEND:VCARD\n";
+  }
+  const auto result = parseVCards(text, "many.vcf");
+  ASSERT_EQ(result.contacts.size(), 20'000u);
+  EXPECT_EQ(result.contacts.back().formattedName, "Person 19999");
+  EXPECT_EQ(result.contacts.back().identifier, "many.vcf#19999");
+}
+
+TEST(VCardBadInput, ACardOverTheSizeLimitIsSkippedAndTheNextOneRead) {
+  const std::string filler(std::size_t{33} << 20, 'A');
+  const auto result = parseVCards("BEGIN:VCARD\r\nFN:Huge\r\nPHOTO;ENCODING=b:" + filler +
+                                      "\r\nEND:VCARD\r\nBEGIN:VCARD\r\nFN:Small\r\nEND:VCARD\r\n",
+                                  "huge.vcf");
+  ASSERT_EQ(result.contacts.size(), 1u);
+  EXPECT_EQ(result.contacts[0].formattedName, "Small");
+  EXPECT_EQ(result.contacts[0].identifier, "huge.vcf#1");
+  EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB"}));
+}
+
+TEST(VCardBadInput, RandomBytesNeverBreakTheReader) {
+  std::mt19937 random(42);
+  const std::string header = "BEGIN:VCARD\r\nFN:";
+  for (int round = 0; round < 200; ++round) {
+    std::string text = round % 2 ? header : std::string();
+    const std::size_t length = random() % 2000;
+    for (std::size_t i = 0; i < length; ++i) {
+      // Bias towards the characters that drive the reader.
+      static constexpr char kSpecial[] = ":;=\\,\"\r\n \t.";
+      text += random() % 3 ? static_cast<char>(random()) : kSpecial[random() % (sizeof kSpecial - 1)];
+    }
+    if (round % 3 == 0) text += "\r\nEND:VCARD\r\n";
+    const auto result = parseVCards(text, "junk.vcf");
+    for (const Contact& c : result.contacts) {
+      EXPECT_FALSE(c.identifier.empty());
+      EXPECT_TRUE(allTextIsUtf8(c));
+    }
+  }
+}
+
+}  // namespace
+}  // namespace kyn::platform
