@@ -152,6 +152,8 @@ void Plugin::onLog(int /*level*/, const char* message, void* context) {
   self->log_.emplace_back(message);
 }
 
+void* Plugin::symbol(const char* name) const { return dlsym(handle_, name); }
+
 std::vector<std::string> Plugin::logLines() const {
   std::lock_guard lock(logMutex_);
   return log_;

@@ -84,6 +84,8 @@ class Plugin {
   [[nodiscard]] std::vector<int> replyCounts();
 
   [[nodiscard]] std::vector<std::string> logLines() const;
+  /// Another entry point of the plug-in.
+  [[nodiscard]] void* symbol(const char* name) const;
 
   decltype(&kyn_plugin_perform) performFn = nullptr;
 

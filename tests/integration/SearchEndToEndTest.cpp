@@ -254,3 +254,32 @@ TEST_F(SearchEndToEnd, HostileBodiesEachEndInOneReply) {
 
 }  // namespace
 }  // namespace kyn::itest
+
+namespace kyn::itest {
+namespace {
+
+// A host may unload the plug-in and load it again in the same process; the libraries it uses (ICU,
+// curl) stay loaded meanwhile and must not keep pointers into the unloaded plug-in.
+TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
+  test::TempDir configDir;
+  Account(configDir.path()).write("localhost:1", std::nullopt);
+  const std::string location = R"({"class":"AXKynLocation","city":"Paris","stateCode":"IDF","locationDate":0})";
+  for (int load = 0; load < 2; ++load) {
+    Plugin plugin;
+    plugin.configure(configDir.path(), "de");
+    auto describe = reinterpret_cast<decltype(&kyn_plugin_describe_location)>(plugin.symbol("kyn_plugin_describe_location"));
+    auto release = reinterpret_cast<decltype(&kyn_plugin_free)>(plugin.symbol("kyn_plugin_free"));
+    char* text = describe(location.c_str(), 1);
+    ASSERT_NE(text, nullptr) << "load " << load;
+    const Json described = Json::parse(text);
+    release(text);
+    EXPECT_EQ(described["place"], "Paris, IDF") << "load " << load;
+    EXPECT_TRUE(described["age"].get<std::string>().starts_with("Vor ")) << "load " << load;  // German, from ICU
+    const auto outcome = plugin.perform(searchFor({"ada@example.com"}));  // nothing listens on port 1
+    EXPECT_EQ(outcome.replies, 1);
+    EXPECT_EQ((*outcome.reply)["errorCode"], 1005);
+  }
+}
+
+}  // namespace
+}  // namespace kyn::itest

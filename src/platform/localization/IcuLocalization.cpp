@@ -8,21 +8,30 @@
 #include <unicode/ures.h>
 
 #include <cstddef>
+#include <cstring>
+#include <new>
 #include <mutex>
 
 namespace kyn::platform {
 
 extern const unsigned char kynStringsData[];
+extern const std::size_t kynStringsDataSize;
 
 namespace {
 
 constexpr const char* kPackage = "kynstrings";
 
+// ICU keeps the registered package for the rest of the process, and ICU outlives the plug-in when a
+// host unloads and loads it again. So ICU is handed a copy on the heap that is never freed rather
+// than the plug-in's own bytes: after a reload the name is taken and that copy, still valid, serves.
 void registerPackage() {
   static std::once_flag once;
   std::call_once(once, [] {
+    auto* copy = static_cast<unsigned char*>(::operator new(kynStringsDataSize, std::align_val_t{16}));
+    std::memcpy(copy, kynStringsData, kynStringsDataSize);
     UErrorCode status = U_ZERO_ERROR;
-    udata_setAppData(kPackage, kynStringsData, &status);
+    udata_setAppData(kPackage, copy, &status);
+    if (status != U_ZERO_ERROR) ::operator delete(copy, std::align_val_t{16});  // an earlier load's copy serves
   });
 }
 
