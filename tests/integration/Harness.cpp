@@ -123,7 +123,7 @@ void Account::addCard(const std::string& fileName, const std::string& card) cons
   writeFile(dir / "contacts" / fileName, card, 0644);
 }
 
-Plugin::Plugin() {
+Plugin::Plugin(bool captureLog) {
   handle_ = dlopen(KYN_PLUGIN_PATH, RTLD_NOW | RTLD_LOCAL);
   if (handle_ == nullptr) throw std::runtime_error(std::string("cannot load the plug-in: ") + dlerror());
   performFn = reinterpret_cast<decltype(performFn)>(dlsym(handle_, "kyn_plugin_perform"));
@@ -133,8 +133,12 @@ Plugin::Plugin() {
   auto setCallback =
       reinterpret_cast<decltype(&kyn_plugin_set_log_callback)>(dlsym(handle_, "kyn_plugin_set_log_callback"));
   if (!performFn || !configure_ || !shutdown_ || !setLevel || !setCallback) throw std::runtime_error("entry point missing");
-  setLevel("debug");
-  setCallback(&Plugin::onLog, this);
+  if (captureLog) {
+    setLevel("debug");
+    setCallback(&Plugin::onLog, this);
+  } else {
+    setLevel("off");
+  }
 }
 
 Plugin::~Plugin() {

@@ -62,7 +62,8 @@ struct Account {
 /// The plug-in, loaded with dlopen; every log line is kept.
 class Plugin {
  public:
-  Plugin();
+  /// Loads the plug-in; with `captureLog`, every log line down to debug is kept, else none is made.
+  explicit Plugin(bool captureLog = true);
   ~Plugin();
   Plugin(const Plugin&) = delete;
   Plugin& operator=(const Plugin&) = delete;

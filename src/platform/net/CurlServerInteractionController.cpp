@@ -234,8 +234,10 @@ class Engine : public std::enable_shared_from_this<Engine> {
     KYJSONCommand& command = *shared;
     long status = 0;
     long redirects = 0;
+    long connects = 0;
     char* effective = nullptr;
     curl_easy_getinfo(transfer.easy, CURLINFO_RESPONSE_CODE, &status);
+    curl_easy_getinfo(transfer.easy, CURLINFO_NUM_CONNECTS, &connects);
     curl_easy_getinfo(transfer.easy, CURLINFO_REDIRECT_COUNT, &redirects);
     curl_easy_getinfo(transfer.easy, CURLINFO_EFFECTIVE_URL, &effective);
 
@@ -244,6 +246,8 @@ class Engine : public std::enable_shared_from_this<Engine> {
     if (code == CURLE_OK && !transfer.overflowed) {
       command.setResponseBody(transfer.response, JsonLimits{settings_.maxResponseBytes, JsonLimits{}.maxDepth});
     }
+    Log::shared().log(LogLevel::Debug, "Request to %@ ended: HTTP %ld, %ld new connection(s)", transfer.request.url,
+                      status, connects);
     if (code != CURLE_OK) {
       const char* reason = transfer.overflowed ? "the response is larger than allowed"
                            : transfer.error[0] != '\0' ? transfer.error

@@ -4,14 +4,67 @@
 #include <phonenumbers/phonenumberutil.h>
 
 #include <cctype>
+#include <list>
+#include <mutex>
+#include <unordered_map>
 
 namespace kyn::platform {
 
+namespace {
+
+/// Reads and writes one number; the work behind `formatPhoneNumber`.
+std::optional<std::string> readAndWrite(std::string_view text, std::string_view region, PhoneNumberStyle style);
+
+/// The last results, most recent first. Every command reads its friends' numbers again, and the
+/// parser takes some 20 µs a number, so the few hundred most recent results are kept.
+class ResultCache {
+ public:
+  std::optional<std::optional<std::string>> find(const std::string& key) {
+    std::lock_guard lock(mutex_);
+    const auto it = index_.find(key);
+    if (it == index_.end()) return std::nullopt;
+    order_.splice(order_.begin(), order_, it->second);
+    return it->second->second;
+  }
+  void insert(std::string key, std::optional<std::string> result) {
+    std::lock_guard lock(mutex_);
+    if (index_.count(key) != 0) return;
+    order_.emplace_front(std::move(key), std::move(result));
+    index_.emplace(order_.front().first, order_.begin());
+    if (order_.size() > kCapacity) {
+      index_.erase(order_.back().first);
+      order_.pop_back();
+    }
+  }
+
+ private:
+  static constexpr std::size_t kCapacity = 512;
+  using Entry = std::pair<std::string, std::optional<std::string>>;
+  std::mutex mutex_;
+  std::list<Entry> order_;
+  std::unordered_map<std::string_view, std::list<Entry>::iterator> index_;
+};
+
+}  // namespace
+
 std::optional<std::string> formatPhoneNumber(std::string_view text, std::string_view region, PhoneNumberStyle style) {
-  using i18n::phonenumbers::PhoneNumber;
-  using i18n::phonenumbers::PhoneNumberUtil;
   // The parser's own limit is 250 characters; longer texts are no phone number anyway.
   if (text.empty() || text.size() > 250) return std::nullopt;
+  static ResultCache cache;
+  std::string key;
+  key.reserve(text.size() + region.size() + 3);
+  key.append(1, static_cast<char>('0' + static_cast<int>(style))).append(region).append(1, '\0').append(text);
+  if (auto cached = cache.find(key)) return *cached;
+  auto result = readAndWrite(text, region, style);
+  cache.insert(std::move(key), result);
+  return result;
+}
+
+namespace {
+
+std::optional<std::string> readAndWrite(std::string_view text, std::string_view region, PhoneNumberStyle style) {
+  using i18n::phonenumbers::PhoneNumber;
+  using i18n::phonenumbers::PhoneNumberUtil;
   std::string regionCode = region.empty() ? std::string("ZZ") : std::string(region);
   for (char& c : regionCode) c = static_cast<char>(std::toupper(static_cast<unsigned char>(c)));
 
@@ -31,10 +84,11 @@ std::optional<std::string> formatPhoneNumber(std::string_view text, std::string_
     return out.empty() ? std::nullopt : std::optional<std::string>(out);
   }
   util->Format(number, PhoneNumberUtil::E164, &out);
-  // The parser's E.164 text of an unusual number may not read back as itself (zeros kept after the
-  // country code the first time are dropped one per reading). Canonical texts key friends, so the
+  // The E.164 text of a number with leading zeros may not read back as itself (zeros kept after the
+  // country code the first time are dropped one per reading). Canonical texts key friends, so such a
   // result is read again until it stands still; each change shortens it, so this ends. A text that
-  // never settled would be no canonical text at all.
+  // never settled would be no canonical text at all. Other possible numbers read back as themselves.
+  if (!number.italian_leading_zero()) return out.empty() ? std::nullopt : std::optional<std::string>(out);
   for (int round = 0;; ++round) {
     if (round > 24) return std::nullopt;
     PhoneNumber again;
@@ -48,4 +102,5 @@ std::optional<std::string> formatPhoneNumber(std::string_view text, std::string_
   return out;
 }
 
+}  // namespace
 }  // namespace kyn::platform

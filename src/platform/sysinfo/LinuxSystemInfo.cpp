@@ -14,6 +14,7 @@
 #include <cstdio>
 #include <cstdlib>
 #include <fstream>
+#include <mutex>
 
 namespace kyn::platform {
 namespace {
@@ -35,24 +36,21 @@ std::string trim(std::string_view s) {
 std::optional<std::string> readText(const std::filesystem::path& path, std::size_t limit) {
   std::ifstream in(path, std::ios::binary);
   if (!in) return std::nullopt;
-  std::string text(limit + 1, '\0');
-  in.read(text.data(), static_cast<std::streamsize>(text.size()));
-  text.resize(static_cast<std::size_t>(in.gcount()));
-  if (text.size() > limit) return std::nullopt;
+  std::string text;
+  char buffer[4096];
+  while (in.read(buffer, sizeof buffer) || in.gcount() > 0) {
+    text.append(buffer, static_cast<std::size_t>(in.gcount()));
+    if (text.size() > limit) return std::nullopt;
+  }
   return text;
 }
 
 }  // namespace
 
-std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
-  std::error_code ec;
-  if (!std::filesystem::exists(file, ec)) return std::nullopt;
-  auto text = readText(file, kMaxAccountBytes);
-  if (!text) {
-    Log::shared().error("Account file %@ cannot be read or is too large; no account is signed in", file.string());
-    return std::nullopt;
-  }
-  auto json = parseJson(*text);
+namespace {
+
+std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, const std::string& text) {
+  auto json = parseJson(text);
   if (!json || !json->is_object()) {
     Log::shared().error("Account file %@ is not a JSON object; no account is signed in", file.string());
     return std::nullopt;
@@ -78,6 +76,34 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   readString("serviceHost", account.serviceHost);
   readBool("provisioned", account.provisioned);
   readBool("restricted", account.restricted);
+  return account;
+}
+
+}  // namespace
+
+std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
+  std::error_code ec;
+  if (!std::filesystem::exists(file, ec)) return std::nullopt;
+  auto text = readText(file, kMaxAccountBytes);
+  if (!text) {
+    Log::shared().error("Account file %@ cannot be read or is too large; no account is signed in", file.string());
+    return std::nullopt;
+  }
+  // Every command reads the account afresh; the text is parsed again only when it changed.
+  struct Parsed {
+    std::filesystem::path path;
+    std::string text;
+    std::optional<AccountFile> account;
+  };
+  static std::mutex mutex;
+  static std::optional<Parsed> last;
+  {
+    std::lock_guard lock(mutex);
+    if (last && last->path == file && last->text == *text) return last->account;
+  }
+  auto account = parseAccountFile(file, *text);
+  std::lock_guard lock(mutex);
+  last = Parsed{file, std::move(*text), account};
   return account;
 }
 
