@@ -1,7 +1,6 @@
-// End to end: the server in this process and as its own program, over real HTTPS on loopback.
+// The program itself. What it answers over HTTPS is covered by the end-to-end tests of the plug-in.
 #include "sim/Files.h"
 #include "sim/Router.h"
-#include "sim/Simulator.h"
 #include "TempDir.h"
 
 #include <httplib.h>
@@ -10,7 +9,6 @@
 
 #include <chrono>
 #include <csignal>
-#include <future>
 #include <sstream>
 #include <thread>
 
@@ -24,156 +22,21 @@ extern char** environ;
 namespace kyn::sim {
 namespace {
 
-using std::chrono::steady_clock;
-
 constexpr const char* kPerson = "1000000001";
 constexpr const char* kToken = "s3cret-Token-41";
 constexpr const char* kData = R"({"friends": {"ada@example.com": {"location": {"latitude": 45.5, "longitude": -122.6,
                                   "address": {"locality": "Portland"}}, "ageSeconds": 60}}})";
 constexpr const char* kBody = R"({"clientContext": {"locale": "en-US"}, "handles": ["ada@example.com"]})";
 
-std::vector<Json> readLog(const std::filesystem::path& path) {
-  std::vector<Json> lines;
-  std::istringstream in(readFile(path));
-  for (std::string line; std::getline(in, line);) lines.push_back(Json::parse(line));
-  return lines;
-}
-
 // A client that trusts only the CA the server wrote, and checks the host name against it.
-httplib::Result post(const std::filesystem::path& ca, const std::string& address, int port, const std::string& token,
-                     httplib::Headers headers = {}) {
+httplib::Result post(const std::filesystem::path& ca, const std::string& address, int port, const std::string& token) {
   httplib::SSLClient client(address, port);
   client.set_ca_cert_path(ca.c_str());
   client.enable_server_certificate_verification(true);
   client.set_basic_auth(kPerson, token.c_str());
   client.set_read_timeout(std::chrono::seconds(20));
-  headers.emplace("X-Zanto-Vorn-API-Ver", "4.0");
-  return client.Post(std::string(kGetLocationsPath).c_str(), headers, kBody, "application/json");
-}
-
-Options canonical(std::string host) {
-  Options o;
-  o.canonicalHost = std::move(host);
-  return o;
-}
-
-Options faulty(const std::string& text, std::optional<long> count = std::nullopt) {
-  Options o;
-  o.fault = parseFault(text);
-  o.faultCount = count;
-  return o;
-}
-
-class SimulatorTest : public ::testing::Test {
- protected:
-  void start(Options options = {}) {
-    writeFileAtomically(dir / "friends.json", kData);
-    options.personId = kPerson;
-    options.token = kToken;
-    options.dataPath = dir / "friends.json";
-    options.caOut = dir / "ca.pem";
-    options.portFile = dir / "port";
-    options.logFile = dir / "log.jsonl";
-    sim = std::make_unique<Simulator>(std::move(options));
-    sim->observeRequests([this](const Json&) {
-      if (!arrived.exchange(true)) firstArrival.set_value();
-    });
-    sim->bind();  // connections queue from here on: no waiting needed
-    server = std::thread([this] { sim->run(); });
-  }
-  void TearDown() override {
-    if (sim) sim->stop();
-    if (server.joinable()) server.join();
-  }
-  httplib::Result post(const std::string& token, httplib::Headers headers = {}) {
-    return sim::post(dir / "ca.pem", "127.0.0.1", sim->port(), token, std::move(headers));
-  }
-
-  test::TempDir dir;
-  std::unique_ptr<Simulator> sim;
-  std::thread server;
-  std::atomic<bool> arrived{false};
-  std::promise<void> firstArrival;
-};
-
-TEST_F(SimulatorTest, AnswersTheRightTokenAndRefusesAWrongOne) {
-  start();
-  EXPECT_EQ(readFile(dir / "port"), std::to_string(sim->port()) + "\n");
-
-  auto res = post(kToken);
-  ASSERT_TRUE(res) << httplib::to_string(res.error());
-  EXPECT_EQ(res->status, 200);
-  EXPECT_EQ(res->get_header_value("Content-Type"), "application/json");
-  const Json answer = Json::parse(res->body);
-  EXPECT_EQ(answer["statusCode"], 200);
-  EXPECT_EQ(answer["locations"]["ada@example.com"]["location"]["address"]["locality"], "Portland");
-
-  res = post("s3cret-Token-4");
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 401);
-  EXPECT_EQ(Json::parse(res->body)["statusCode"], 401);
-
-  const auto log = readLog(dir / "log.jsonl");
-  ASSERT_EQ(log.size(), 2u);
-  EXPECT_EQ(log[0]["host"], "127.0.0.1:" + std::to_string(sim->port()));
-  EXPECT_EQ(log[0]["authorised"], true);
-  EXPECT_EQ(log[0]["apiVersion"], "4.0");
-  EXPECT_EQ(log[1]["authorised"], false);
-  EXPECT_EQ(log[1]["status"], 401);
-  EXPECT_EQ(readFile(dir / "log.jsonl").find("s3cret"), std::string::npos);
-}
-
-TEST_F(SimulatorTest, RedirectsOtherHostsToTheCanonicalOne) {
-  start(canonical("127.0.0.1"));
-  const std::string port = std::to_string(sim->port());
-  auto res = post(kToken, {{"Host", "localhost:" + port}});
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 307);
-  EXPECT_EQ(res->get_header_value("Location"), "https://127.0.0.1:" + port + std::string(kGetLocationsPath));
-
-  res = post(kToken);  // the client follows, to 127.0.0.1
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 200);
-  const auto log = readLog(dir / "log.jsonl");
-  ASSERT_EQ(log.size(), 2u);
-  EXPECT_EQ(log[0]["host"], "localhost:" + port);
-  EXPECT_EQ(log[0]["status"], 307);
-  EXPECT_EQ(log[1]["host"], "127.0.0.1:" + port);
-}
-
-TEST_F(SimulatorTest, AResetDropsTheConnectionWithoutAnAnswer) {
-  start(faulty("reset", 1));
-  const auto begin = steady_clock::now();
-  auto res = post(kToken);
-  EXPECT_FALSE(res);
-  EXPECT_EQ(res.error(), httplib::Error::Read);
-  EXPECT_LT(steady_clock::now() - begin, std::chrono::seconds(5));  // at once, not by a time limit
-
-  res = post(kToken);  // the server lives on
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 200);
-  EXPECT_EQ(readLog(dir / "log.jsonl")[0]["status"], nullptr);
-}
-
-TEST_F(SimulatorTest, ATruncatedAnswerEndsBeforeItsContentLength) {
-  start(faulty("truncate", 1));
-  auto res = post(kToken);
-  EXPECT_FALSE(res);
-  EXPECT_EQ(res.error(), httplib::Error::Read);
-  res = post(kToken);
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 200);
-}
-
-TEST_F(SimulatorTest, StopCutsASlowAnswerShort) {
-  start(faulty("slow:60000"));
-  auto client = std::async(std::launch::async, [this] { return post(kToken); });
-  ASSERT_EQ(firstArrival.get_future().wait_for(std::chrono::seconds(20)), std::future_status::ready);
-  const auto begin = steady_clock::now();
-  sim->stop();
-  server.join();
-  EXPECT_LT(steady_clock::now() - begin, std::chrono::seconds(10));
-  (void)client.get();
+  return client.Post(std::string(kGetLocationsPath).c_str(), httplib::Headers{{"X-Zanto-Vorn-API-Ver", "4.0"}}, kBody,
+                     "application/json");
 }
 
 // The program itself: ready line, port file, SIGTERM, exit status, and no token in its output.
