@@ -8,6 +8,7 @@ namespace kyn {
 using platform::services;
 
 Common& Common::sharedInstance() {
+  (void)services();  // made first, so that it outlives the account context
   static Common instance;
   static const bool loaded = (instance.loadAccountInfo(), true);
   (void)loaded;

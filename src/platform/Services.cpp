@@ -1,6 +1,5 @@
 #include "platform/Services.h"
 
-#include "platform/core/NoDestructor.h"
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>
@@ -19,8 +18,12 @@ std::optional<std::string> systemLanguageTag() {
 }
 
 Services& Services::shared() {
-  static NoDestructor<Services> instance;
-  return *instance;
+  // Destruction runs in the reverse order of construction: what the registry's users need while
+  // they are torn down is made first.
+  (void)Log::shared();
+  (void)NotificationCenter::defaultCenter();
+  static Services instance;
+  return instance;
 }
 
 Services::Services()

@@ -5,7 +5,6 @@
 
 #include "platform/assistant/AssistantPreferences.h"
 #include "platform/config/Configuration.h"
-#include "platform/core/NoDestructor.h"
 #include "platform/contacts/ContactStore.h"
 #include "platform/locale/LocaleInfo.h"
 #include "platform/localization/Localization.h"
@@ -49,7 +48,9 @@ class ServiceSlot {
 
 class Services {
  public:
-  /// The process-wide registry; never destroyed.
+  /// The process-wide registry. It lives until the plug-in is unloaded; the log and the notification
+  /// centre are made before it and outlive it, and every process-wide object made later (the account
+  /// context, the data source) is destroyed before it.
   static Services& shared();
 
   /// Reads the configuration of `directory` and drops every service built from the previous one,
@@ -72,7 +73,6 @@ class Services {
   [[nodiscard]] NotificationCenter& notificationCenter() { return NotificationCenter::defaultCenter(); }
 
  private:
-  friend class NoDestructor<Services>;
   Services();
   void resetSlots();
 

@@ -1,6 +1,5 @@
 #include "platform/log/Log.h"
 
-#include "platform/core/NoDestructor.h"
 
 #include <systemd/sd-journal.h>
 
@@ -114,16 +113,18 @@ Log::Log(std::string subsystem, std::string category)
     : subsystem_(std::move(subsystem)), category_(std::move(category)) {}
 
 Log& Log::shared() {
-  static NoDestructor<Log> log(kSubsystem, kCategory);
+  // Destroyed when the plug-in is unloaded, after every object that was made after it: the services
+  // registry makes it first, so that what logs while it is torn down still finds it.
+  static Log log(kSubsystem, kCategory);
   static const bool configured = [] {
     if (const char* env = std::getenv("KYN_LOG_LEVEL")) {
-      if (auto level = logLevelFromName(env)) log->setMinimumLevel(*level);
+      if (auto level = logLevelFromName(env)) log.setMinimumLevel(*level);
     }
-    log->setSink(makeSystemLogSink());
+    log.setSink(makeSystemLogSink());
     return true;
   }();
   (void)configured;
-  return *log;
+  return log;
 }
 
 std::shared_ptr<LogSink> Log::setSink(std::shared_ptr<LogSink> sink) {

@@ -1,14 +1,13 @@
 #include "platform/notify/NotificationCenter.h"
 
-#include "platform/core/NoDestructor.h"
 
 #include <algorithm>
 
 namespace kyn::platform {
 
 NotificationCenter& NotificationCenter::defaultCenter() {
-  static NoDestructor<NotificationCenter> center;
-  return *center;
+  static NotificationCenter center;  // made before the services registry, so destroyed after it
+  return center;
 }
 
 NotificationCenter::Token NotificationCenter::addObserver(std::string name, Observer observer) {

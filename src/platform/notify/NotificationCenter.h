@@ -24,7 +24,7 @@ class NotificationCenter {
   using Observer = std::function<void(const Notification&)>;
   using Token = std::uint64_t;
 
-  /// The process-wide default centre; never destroyed.
+  /// The process-wide default centre.
   static NotificationCenter& defaultCenter();
 
   NotificationCenter() = default;
