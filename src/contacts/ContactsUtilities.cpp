@@ -57,6 +57,13 @@ ContactRef ContactsUtilities::contactForAssistantId(const std::optional<std::str
   return store->unifiedContactWithIdentifier(*identifier, contactKeys(), nullptr);
 }
 
+void ContactsUtilities::fillPersonFromContact(const platform::Contact& contact, AXPerson& person) {
+  person.firstName = contact.givenName;
+  person.lastName = contact.familyName;
+  person.fullName = platform::fullNameOfContact(contact, services().locale.get()->localeId());
+  person.identifier = platform::assistantIdentifierForContactIdentifier(contact.identifier);
+}
+
 ContactRef ContactsUtilities::findOptimalContactInContacts(const std::vector<ContactRef>* contacts) {
   if (contacts == nullptr || contacts->empty()) return nullptr;
   const ContactRef& first = contacts->front();

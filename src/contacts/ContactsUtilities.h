@@ -1,5 +1,6 @@
 #pragma once
 
+#include "platform/assistant/Model.h"
 #include "platform/contacts/ContactStore.h"
 #include "platform/image/Image.h"
 
@@ -35,6 +36,8 @@ class ContactsUtilities {
   [[nodiscard]] static std::shared_ptr<platform::ContactStore> contactStore();
   /// The 30 properties every fetch asks for, in their fixed order; a new list on each call.
   [[nodiscard]] static platform::ContactKeys contactKeys();
+  /// Gives a person the contact's names (given, family, full) and its assistant identifier.
+  static void fillPersonFromContact(const platform::Contact& contact, AXPerson& person);
   /// Of several matches the first with a full picture (thumbnails do not count), otherwise the first.
   [[nodiscard]] static ContactRef findOptimalContactInContacts(const std::vector<ContactRef>* contacts);
 };

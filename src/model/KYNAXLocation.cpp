@@ -128,12 +128,7 @@ std::shared_ptr<AXPerson> KYNAXLocation::personForEmailFromContacts(const std::o
   auto entry = std::make_shared<AXEmail>();
   entry->emailAddress = email;
   person->emails = std::vector{entry};
-  if (auto contact = ContactsUtilities::contactForEmail(email)) {
-    person->firstName = contact->givenName;
-    person->lastName = contact->familyName;
-    person->fullName = platform::fullNameOfContact(*contact, services().locale.get()->localeId());
-    person->identifier = platform::assistantIdentifierForContactIdentifier(contact->identifier);
-  }
+  if (auto contact = ContactsUtilities::contactForEmail(email)) ContactsUtilities::fillPersonFromContact(*contact, *person);
   return person;
 }
 
@@ -142,12 +137,7 @@ std::shared_ptr<AXPerson> KYNAXLocation::personForPhoneFromContacts(const std::o
   auto entry = std::make_shared<AXPhone>();
   entry->number = phone;
   person->phones = std::vector{entry};
-  if (auto contact = ContactsUtilities::contactForPhone(phone)) {
-    person->firstName = contact->givenName;
-    person->lastName = contact->familyName;
-    person->fullName = platform::fullNameOfContact(*contact, services().locale.get()->localeId());
-    person->identifier = platform::assistantIdentifierForContactIdentifier(contact->identifier);
-  }
+  if (auto contact = ContactsUtilities::contactForPhone(phone)) ContactsUtilities::fillPersonFromContact(*contact, *person);
   return person;
 }
 

@@ -79,10 +79,7 @@ char* copyText(const std::string& text) {
 
 std::shared_ptr<AXPerson> personForContact(const platform::Contact& contact) {
   auto person = std::make_shared<AXPerson>();
-  person->firstName = contact.givenName;
-  person->lastName = contact.familyName;
-  person->fullName = platform::fullNameOfContact(contact, services().locale.get()->localeId());
-  person->identifier = platform::assistantIdentifierForContactIdentifier(contact.identifier);
+  ContactsUtilities::fillPersonFromContact(contact, *person);
   person->emails.emplace();
   for (const auto& e : contact.emailAddresses) {
     person->emails->push_back(std::make_shared<AXEmail>());

@@ -1,20 +1,13 @@
 #include "account/Common.h"
-#include "support/FakeContactStore.h"
-#include "support/PlatformTest.h"
+#include "support/ContactsTest.h"
 
 namespace kyn {
 namespace {
 
 using platform::services;
 
-class HandlesTest : public test::PlatformTest {
+class HandlesTest : public test::ContactsTest {
  protected:
-  void SetUp() override {
-    PlatformTest::SetUp();
-    services().locale.set(std::make_shared<platform::IcuLocaleInfo>("en_US"));
-    store = std::make_shared<test::FakeContactStore>();
-    services().contactStore.set(store);
-  }
   static std::shared_ptr<AXPerson> person(std::vector<std::optional<std::string>> phones,
                                           std::vector<std::optional<std::string>> emails) {
     auto p = std::make_shared<AXPerson>();
@@ -31,7 +24,6 @@ class HandlesTest : public test::PlatformTest {
     return p;
   }
   Common common;
-  std::shared_ptr<test::FakeContactStore> store;
 };
 
 TEST_F(HandlesTest, OnlyLeadingJunkIsCutBeforeParsing) {

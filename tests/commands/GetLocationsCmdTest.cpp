@@ -1,7 +1,6 @@
 #include "commands/GetLocationsCmd.h"
 #include "platform/value/Json.h"
-#include "support/FakeContactStore.h"
-#include "support/PlatformTest.h"
+#include "support/ContactsTest.h"
 #include "utils/KYNAXUtils.h"
 
 namespace kyn {
@@ -24,12 +23,10 @@ std::shared_ptr<AXPerson> person(std::vector<std::string> emails, std::vector<st
   return p;
 }
 
-class GetLocationsCmdTest : public test::PlatformTest {
+class GetLocationsCmdTest : public test::ContactsTest {
  protected:
   void SetUp() override {
-    PlatformTest::SetUp();
-    services().locale.set(std::make_shared<platform::IcuLocaleInfo>("en_US"));
-    services().contactStore.set(std::make_shared<test::FakeContactStore>());
+    ContactsTest::SetUp();
     systemInfo->signIn();
   }
   static std::shared_ptr<GetLocationsCmd> answered(const char* body) {

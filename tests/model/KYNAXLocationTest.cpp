@@ -1,21 +1,14 @@
 #include "model/KYNAXLocation.h"
 #include "platform/value/Json.h"
-#include "support/FakeContactStore.h"
-#include "support/PlatformTest.h"
+#include "support/ContactsTest.h"
 
 namespace kyn {
 namespace {
 
 using platform::services;
 
-class KYNAXLocationTest : public test::PlatformTest {
+class KYNAXLocationTest : public test::ContactsTest {
  protected:
-  void SetUp() override {
-    PlatformTest::SetUp();
-    services().locale.set(std::make_shared<platform::IcuLocaleInfo>("en_US"));
-    store = std::make_shared<test::FakeContactStore>();
-    services().contactStore.set(store);
-  }
   static std::shared_ptr<KYNAXLocation> decode(const char* json, std::optional<std::string> handle = "ada@example.com") {
     const Value entry = Value::parse(json);
     return KYNAXLocation::locationWithHandle(handle, std::make_shared<AXPerson>(), &entry);
@@ -36,7 +29,6 @@ class KYNAXLocationTest : public test::PlatformTest {
     }
     return KYNAXLocation::locationWithHandle("h", person, nullptr);
   }
-  std::shared_ptr<test::FakeContactStore> store;
 };
 
 TEST_F(KYNAXLocationTest, DecodesAFullEntry) {

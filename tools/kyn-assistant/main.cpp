@@ -302,37 +302,32 @@ int main(int argc, char** argv) {
     return kUsage;
   }
 
+  // Ends the program for wrong options, after unloading the plug-in.
+  auto usageError = [&](const std::string& message) {
+    std::cerr << "kyn-assistant: " << message << "\n";
+    plugin.unload();
+    return kUsage;
+  };
+
   Json command;
   std::optional<std::string> askedPlace;
   if (search->parsed()) {
     command = {{"class", "AXKynSearch"}, {"friends", Json::array()}};
     for (const auto& who : friends) {
       auto person = resolveFriend(plugin, who, error);
-      if (!person) {
-        std::cerr << "kyn-assistant: " << error << "\n";
-        plugin.unload();
-        return kUsage;
-      }
+      if (!person) return usageError(error);
       command["friends"].push_back(*person);
     }
     if (!here.empty()) {
       auto location = parseCoordinate(here, true);
-      if (!location) {
-        std::cerr << "kyn-assistant: --here wants LAT,LON or LAT,LON,ACCURACY, not \"" << here << "\"\n";
-        plugin.unload();
-        return kUsage;
-      }
+      if (!location) return usageError("--here wants LAT,LON or LAT,LON,ACCURACY, not \"" + here + "\"");
       command["currentLocation"] = *location;
     }
     if (!place.empty() || !placeAt.empty()) {
       Json requested = {{"class", "AXLocation"}};
       if (!placeAt.empty()) {
         auto location = parseCoordinate(placeAt, false);
-        if (!location) {
-          std::cerr << "kyn-assistant: --place-at wants LAT,LON, not \"" << placeAt << "\"\n";
-          plugin.unload();
-          return kUsage;
-        }
+        if (!location) return usageError("--place-at wants LAT,LON, not \"" + placeAt + "\"");
         requested = *location;
       }
       if (!place.empty()) {
@@ -348,11 +343,7 @@ int main(int argc, char** argv) {
       text << std::cin.rdbuf();
     } else {
       std::ifstream in(commandFile, std::ios::binary);
-      if (!in) {
-        std::cerr << "kyn-assistant: cannot read " << commandFile << "\n";
-        plugin.unload();
-        return kUsage;
-      }
+      if (!in) return usageError("cannot read " + commandFile);
       text << in.rdbuf();
     }
     command = Json::parse(text.str(), nullptr, false);
