@@ -35,6 +35,10 @@ void KYNAXDataSource::setServerInteractionController(std::shared_ptr<platform::K
   // `previous` goes here, outside the lock: its destructor may complete commands in flight.
 }
 
+namespace {
+
+/// The reply to a finished search: 417 and 411 in the body are failures, every other body status a
+/// completed search; a failed transfer is "not logged in" for HTTP 401 and "not available" otherwise.
 std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command) {
   auto& log = services().log();
   // Reading the result parses the response and so fills the status code: it comes first.
@@ -56,6 +60,8 @@ std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command) {
   log.notice("Error code response: %ld", code);
   return AXCommandFailed::commandFailedWithErrorCode(code);
 }
+
+}  // namespace
 
 void KYNAXDataSource::search(const AXKynSearch& command, AXCompletion completion) {
   auto request = std::make_shared<GetLocationsCmd>();

@@ -42,10 +42,4 @@ class KYNAXDataSource {
   std::optional<Value> mockLocations_;
 };
 
-/// The reply to a finished search: 417 and 411 in the body are failures, every other body status a
-/// completed search; a failed transfer is "not logged in" for HTTP 401 and "not available" otherwise.
-/// Exposed for the data source and its tests.
-class GetLocationsCmd;
-[[nodiscard]] std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command);
-
 }  // namespace kyn

@@ -8,21 +8,6 @@ using platform::services;
 
 class HandlesTest : public test::ContactsTest {
  protected:
-  static std::shared_ptr<AXPerson> person(std::vector<std::optional<std::string>> phones,
-                                          std::vector<std::optional<std::string>> emails) {
-    auto p = std::make_shared<AXPerson>();
-    if (!phones.empty()) p->phones.emplace();
-    for (auto& n : phones) {
-      p->phones->push_back(std::make_shared<AXPhone>());
-      p->phones->back()->number = n;
-    }
-    if (!emails.empty()) p->emails.emplace();
-    for (auto& e : emails) {
-      p->emails->push_back(std::make_shared<AXEmail>());
-      p->emails->back()->emailAddress = e;
-    }
-    return p;
-  }
   Common common;
 };
 
@@ -51,7 +36,7 @@ TEST_F(HandlesTest, TheLocalesCountryReadsNationalNumbers) {
 }
 
 TEST_F(HandlesTest, PhonesFirstThenEmailsWithDuplicatesKept) {
-  const auto p = person({"(503) 555-0101", "503.555.0101"}, {"ada@example.com"});
+  const auto p = test::makePerson({"ada@example.com"}, {"(503) 555-0101", "503.555.0101"});
   EXPECT_EQ(common.handlesForAXPerson(*p),
             (std::vector<std::string>{"+15035550101", "+15035550101", "ada@example.com"}));
 }
@@ -59,23 +44,23 @@ TEST_F(HandlesTest, PhonesFirstThenEmailsWithDuplicatesKept) {
 TEST_F(HandlesTest, WithoutPhonesOfItsOwnThePersonsContactLendsItsNumbers) {
   auto& contact = store->add("ada-1");
   contact.phoneNumbers = {{"mobile", "(503) 555-0101"}, {"work", "+44 20 7946 0018"}};
-  auto p = person({}, {"Ada@Example.com"});
+  auto p = test::makePerson({"Ada@Example.com"}, {});
   p->identifier = platform::assistantIdentifierForContactIdentifier("ada-1");
   EXPECT_EQ(common.handlesForAXPerson(*p),
             (std::vector<std::string>{"+15035550101", "+442079460018", "Ada@Example.com"}));
   // A phone entry without a number brings nothing, so the contact still lends its numbers.
-  auto q = person({std::nullopt}, {});
+  auto q = test::makePerson({}, {std::nullopt});
   q->identifier = p->identifier;
   EXPECT_EQ(common.handlesForAXPerson(*q).size(), 2u);
   // A person with a number of its own never gets the contact's.
-  auto r = person({"+1 503 555 0199"}, {});
+  auto r = test::makePerson({}, {"+1 503 555 0199"});
   r->identifier = p->identifier;
   EXPECT_EQ(common.handlesForAXPerson(*r), (std::vector<std::string>{"+15035550199"}));
 }
 
 TEST_F(HandlesTest, APersonWithNothingHasNoHandles) {
   EXPECT_TRUE(common.handlesForAXPerson(AXPerson{}).empty());
-  EXPECT_TRUE(common.handlesForAXPerson(*person({}, {std::nullopt})).empty());  // address-less entry skipped
+  EXPECT_TRUE(common.handlesForAXPerson(*test::makePerson({std::nullopt}, {})).empty());  // address-less entry skipped
 }
 
 }  // namespace

@@ -8,21 +8,6 @@ namespace {
 
 using platform::services;
 
-std::shared_ptr<AXPerson> person(std::vector<std::string> emails, std::vector<std::string> phones) {
-  auto p = std::make_shared<AXPerson>();
-  p->emails.emplace();
-  for (auto& e : emails) {
-    p->emails->push_back(std::make_shared<AXEmail>());
-    p->emails->back()->emailAddress = e;
-  }
-  p->phones.emplace();
-  for (auto& n : phones) {
-    p->phones->push_back(std::make_shared<AXPhone>());
-    p->phones->back()->number = n;
-  }
-  return p;
-}
-
 class GetLocationsCmdTest : public test::ContactsTest {
  protected:
   void SetUp() override {
@@ -53,7 +38,7 @@ TEST_F(GetLocationsCmdTest, PathAndHeaders) {
 TEST_F(GetLocationsCmdTest, TheBodyHoldsItsKeysInOrderAndOnlyThoseWithValues) {
   GetLocationsCmd command;
   EXPECT_EQ(command.jsonBodyDictionary().size(), 1u);  // clientContext alone
-  command.friends = std::vector{person({"ada@example.com"}, {"(503) 555-0101"}), person({}, {"+44 20 7946 0018"})};
+  command.friends = std::vector{test::makePerson({"ada@example.com"}, {"(503) 555-0101"}), test::makePerson({}, {"+44 20 7946 0018"})};
   command.currentLocation = std::make_shared<const platform::Location>(at(45.5, -122.6));
   command.requestedLocation = std::make_shared<const platform::Location>(at(45.6, -122.7));
   command.requestedLocationLabel = "Home";
@@ -86,8 +71,8 @@ TEST_F(GetLocationsCmdTest, EmptyFriendsSendAnEmptyListAndInvalidPlacesNothing) 
 
 TEST_F(GetLocationsCmdTest, FriendsAreFoundByTheirHandleAsWrittenOnly) {
   GetLocationsCmd command;
-  const auto ada = person({"ada@example.com"}, {"(503) 555-0101"});
-  const auto grace = person({"grace@example.com"}, {"+15035550102"});
+  const auto ada = test::makePerson({"ada@example.com"}, {"(503) 555-0101"});
+  const auto grace = test::makePerson({"grace@example.com"}, {"+15035550102"});
   command.friends = std::vector{ada, grace};
   EXPECT_EQ(command.friendForHandle("ada@example.com"), ada);
   EXPECT_EQ(command.friendForHandle("+15035550102"), grace);
@@ -157,7 +142,7 @@ TEST_F(GetLocationsCmdTest, NotAFriendIsLeftOutAndTheLastMatchWins) {
 
 TEST_F(GetLocationsCmdTest, TheAssistantsOwnPersonIsUsedForItsHandle) {
   auto command = answered(R"({"locations":{"ada@example.com":{},"(503) 555-0101":{},"+15035550101":{}}})");
-  const auto ada = person({"ada@example.com"}, {"(503) 555-0101"});
+  const auto ada = test::makePerson({"ada@example.com"}, {"(503) 555-0101"});
   ada->fullName = "Ada Lovelace";
   command->friends = std::vector{ada};
   const auto list = command->result();

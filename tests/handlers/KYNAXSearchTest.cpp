@@ -23,12 +23,6 @@ class KYNAXSearchTest : public test::PlatformTest {
     KYNAXDataSource::dataSource().setServerInteractionController(nullptr);
     PlatformTest::TearDown();
   }
-  static std::shared_ptr<AXPerson> person(bool email, bool phone) {
-    auto p = std::make_shared<AXPerson>();
-    if (email) p->emails = std::vector{std::make_shared<AXEmail>()};
-    if (phone) p->phones = std::vector{std::make_shared<AXPhone>()};
-    return p;
-  }
   /// Performs and returns every reply, checking that each came before perform returned.
   std::vector<Value> perform(KYNAXSearch& search) {
     std::vector<Value> replies;
@@ -54,9 +48,9 @@ TEST_F(KYNAXSearchTest, WithoutATargetTheReasonAnswersAndTheAccountIsKeptCached)
 TEST_F(KYNAXSearchTest, OnlyTheLastPersonCountsAsATarget) {
   systemInfo->signIn();
   KYNAXSearch search;
-  search.friends = std::vector{person(true, true), person(false, false)};
+  search.friends = std::vector{test::makePerson({std::nullopt}, {std::nullopt}), test::makePerson({}, {})};
   EXPECT_TRUE(search._validate()->reason);
-  search.friends = std::vector{person(false, false), person(false, true)};
+  search.friends = std::vector{test::makePerson({}, {}), test::makePerson({}, {std::nullopt})};
   EXPECT_FALSE(search._validate());
   search.friends = std::vector<std::shared_ptr<AXPerson>>{};
   search.currentLocation = std::make_shared<AXLocation>();
@@ -65,14 +59,14 @@ TEST_F(KYNAXSearchTest, OnlyTheLastPersonCountsAsATarget) {
   search.proximity = "near";
   EXPECT_FALSE(search._validate());
   search.proximity.reset();
-  search.friends = std::vector{person(false, false)};
+  search.friends = std::vector{test::makePerson({}, {})};
   search.friends->back()->emails.emplace();  // present but empty
   EXPECT_TRUE(search._validate());
 }
 
 TEST_F(KYNAXSearchTest, AccountChecksInTheirOrder) {
   KYNAXSearch search;
-  search.friends = std::vector{person(true, false)};
+  search.friends = std::vector{test::makePerson({std::nullopt}, {})};
   // A cached account is dropped before the checks: signing out is seen at once.
   systemInfo->signIn();
   Common::sharedInstance().loadAccountInfo();
@@ -101,7 +95,7 @@ TEST_F(KYNAXSearchTest, AFailureAnswersAtOnceWithoutAskingTheServer) {
 TEST_F(KYNAXSearchTest, AValidSearchGoesToTheDataSource) {
   systemInfo->signIn();
   KYNAXSearch search;
-  search.friends = std::vector{person(true, false)};
+  search.friends = std::vector{test::makePerson({std::nullopt}, {})};
   search.friends->back()->emails->back()->emailAddress = "ada@example.com";
   const auto replies = perform(search);
   ASSERT_EQ(controller->sent().size(), 1u);

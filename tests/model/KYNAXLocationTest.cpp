@@ -13,21 +13,11 @@ class KYNAXLocationTest : public test::ContactsTest {
     const Value entry = Value::parse(json);
     return KYNAXLocation::locationWithHandle(handle, std::make_shared<AXPerson>(), &entry);
   }
-  static std::shared_ptr<KYNAXLocation> withFriend(std::vector<std::string> emails, std::vector<std::string> phones,
+  static std::shared_ptr<KYNAXLocation> withFriend(std::vector<std::optional<std::string>> emails,
+                                                   std::vector<std::optional<std::string>> phones,
                                                    std::optional<std::string> fullName = std::nullopt) {
-    auto person = std::make_shared<AXPerson>();
-    person->fullName = std::move(fullName);
-    if (!emails.empty()) person->emails.emplace();
-    for (auto& e : emails) {
-      person->emails->push_back(std::make_shared<AXEmail>());
-      person->emails->back()->emailAddress = e;
-    }
-    if (!phones.empty()) person->phones.emplace();
-    for (auto& p : phones) {
-      person->phones->push_back(std::make_shared<AXPhone>());
-      person->phones->back()->number = p;
-    }
-    return KYNAXLocation::locationWithHandle("h", person, nullptr);
+    return KYNAXLocation::locationWithHandle("h", test::makePerson(std::move(emails), std::move(phones), std::move(fullName)),
+                                             nullptr);
   }
 };
 

@@ -31,6 +31,23 @@ std::filesystem::path TempDir::write(const std::string& name, std::string_view t
   return file;
 }
 
+std::shared_ptr<AXPerson> makePerson(std::vector<std::optional<std::string>> emails,
+                                     std::vector<std::optional<std::string>> phones, std::optional<std::string> fullName) {
+  auto person = std::make_shared<AXPerson>();
+  person->fullName = std::move(fullName);
+  if (!emails.empty()) person->emails.emplace();
+  for (auto& address : emails) {
+    person->emails->push_back(std::make_shared<AXEmail>());
+    person->emails->back()->emailAddress = std::move(address);
+  }
+  if (!phones.empty()) person->phones.emplace();
+  for (auto& number : phones) {
+    person->phones->push_back(std::make_shared<AXPhone>());
+    person->phones->back()->number = std::move(number);
+  }
+  return person;
+}
+
 platform::Date utcDate(int year, int month, int day, int hour, int minute, double second) {
   using namespace std::chrono;
   const sys_days days = year_month_day{std::chrono::year{year}, std::chrono::month{static_cast<unsigned>(month)},

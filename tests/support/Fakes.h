@@ -3,6 +3,7 @@
 // Fakes of the platform services, installed through the services registry.
 
 #include "platform/Services.h"
+#include "platform/assistant/Model.h"
 
 #include <atomic>
 #include <filesystem>
@@ -83,6 +84,12 @@ class TempDir {
  private:
   std::filesystem::path path_;
 };
+
+/// An assistant person with these e-mail addresses and phone numbers (an absent text makes an entry
+/// without one); a list is present only when it has entries.
+[[nodiscard]] std::shared_ptr<AXPerson> makePerson(std::vector<std::optional<std::string>> emails,
+                                                   std::vector<std::optional<std::string>> phones,
+                                                   std::optional<std::string> fullName = std::nullopt);
 
 /// Seconds since 2001 for a UTC calendar date and time.
 [[nodiscard]] platform::Date utcDate(int year, int month, int day, int hour = 0, int minute = 0, double second = 0);

@@ -71,7 +71,6 @@ class KYJSONCommand : public Object {
   }
   /// Keeps the response body, parsed within `limits`; a body that is not a JSON object reads as none.
   void setResponseBody(std::string_view body, const JsonLimits& limits = {});
-  void setParsedResponse(std::optional<Value> response) { parsedResponse_ = std::move(response); }
   void setRedirect(std::string originalHost, std::string redirectedHost) {
     redirected_ = true;
     originalHost_ = std::move(originalHost);
