@@ -283,3 +283,29 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
 
 }  // namespace
 }  // namespace kyn::itest
+
+namespace kyn::itest {
+namespace {
+
+// The command-line host: a name found in the contacts, and an exit status for each kind of failure.
+TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
+  start();
+  const std::string config = configDir.path().string();
+  const auto found = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada marlowe", "--here",
+                                 "45.5231,-122.6765,30"});
+  EXPECT_EQ(found.status, 0) << found.output;
+  EXPECT_NE(found.output.find("Ada Marlowe — Work · 45.51520, -122.67840 ±65 m"), std::string::npos) << found.output;
+  EXPECT_EQ(sim->requests().back()["handles"], Json::parse(R"(["ada@example.com"])"));
+
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "Nobody Known"}).status, 2);
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--here", "95,1"}).status, 2);
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", (configDir.path() / "missing").string(), "search"}).status, 2);
+
+  std::filesystem::remove(configDir.path() / "account.json");
+  const auto signedOut = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"});
+  EXPECT_EQ(signedOut.status, 1);
+  EXPECT_NE(signedOut.output.find("not signed in"), std::string::npos) << signedOut.output;
+}
+
+}  // namespace
+}  // namespace kyn::itest
