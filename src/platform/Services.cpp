@@ -1,5 +1,7 @@
 #include "platform/Services.h"
 
+#include "platform/sysinfo/LinuxSystemInfo.h"
+
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>
