@@ -48,8 +48,9 @@ class PluginLibrary {
   void* handle_ = nullptr;
 };
 
-/// The plug-in beside the running program (../lib/libkyn-assistant.so), else the bare file name,
-/// which the dynamic loader looks up in its own search path.
+/// The plug-in in the library directory beside the running program's (../lib in the build tree, the
+/// installed library directory after an install), else its bare SONAME, which the dynamic loader
+/// looks up in its own search path.
 [[nodiscard]] std::filesystem::path defaultPluginPath();
 
 }  // namespace kyn::host
