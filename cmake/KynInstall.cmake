@@ -22,6 +22,30 @@ install(FILES ${PROJECT_BINARY_DIR}/kyn-assistant-config.cmake ${PROJECT_BINARY_
   DESTINATION ${kyn_cmake_dir} COMPONENT dev)
 
 # pkg-config --cflags --libs kyn-assistant
-file(RELATIVE_PATH KYN_PC_TO_PREFIX "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/prefix")
+# The system's packages name their prefix; any other install is relocatable, its prefix found from
+# where the file lies.
+if(CMAKE_INSTALL_PREFIX STREQUAL "/usr")
+  set(KYN_PC_PREFIX "/usr")
+else()
+  file(RELATIVE_PATH KYN_PC_PREFIX "/prefix/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/prefix")
+  set(KYN_PC_PREFIX "\${pcfiledir}/${KYN_PC_PREFIX}")
+endif()
 configure_file(${CMAKE_CURRENT_LIST_DIR}/kyn-assistant.pc.in ${PROJECT_BINARY_DIR}/kyn-assistant.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/kyn-assistant.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig COMPONENT dev)
+
+# The Python module (standard library only), where the system's python3 finds it: Debian's own
+# folder under /usr, the version's site folder under any other prefix.
+find_package(Python3 COMPONENTS Interpreter)
+if(CMAKE_INSTALL_PREFIX STREQUAL "/usr" OR NOT Python3_FOUND)
+  set(kyn_python_default "lib/python3/dist-packages")
+else()
+  set(kyn_python_default "lib/python${Python3_VERSION_MAJOR}.${Python3_VERSION_MINOR}/dist-packages")
+endif()
+set(KYN_PYTHON_DIR "${kyn_python_default}" CACHE PATH "Where the Python module is installed, below the prefix")
+install(DIRECTORY ${PROJECT_SOURCE_DIR}/python/kyn_assistant DESTINATION ${KYN_PYTHON_DIR} COMPONENT runtime
+  PATTERN __pycache__ EXCLUDE)
+# The installed module finds the installed plug-in relative to itself.
+file(RELATIVE_PATH kyn_lib_from_module "/prefix/${KYN_PYTHON_DIR}/kyn_assistant" "/prefix/${CMAKE_INSTALL_LIBDIR}")
+file(GENERATE OUTPUT ${PROJECT_BINARY_DIR}/python/_installed.py CONTENT
+  "# Written by the install: where the plug-in lies, seen from this module.\nPLUGIN_FROM_MODULE = \"${kyn_lib_from_module}/$<TARGET_SONAME_FILE_NAME:kyn-assistant>\"\n")
+install(FILES ${PROJECT_BINARY_DIR}/python/_installed.py DESTINATION ${KYN_PYTHON_DIR}/kyn_assistant COMPONENT runtime)

@@ -46,6 +46,11 @@ cmake -S "$work/consumer" -B "$work/consumer/build" -G Ninja -DCMAKE_PREFIX_PATH
 cmake --build "$work/consumer/build" >/dev/null
 [[ "$("$work/consumer/build/version")" == "$version" ]] || fail "the CMake consumer does not run"
 
+# The installed Python module loads the installed plug-in by itself.
+module=$(dirname "$(find "$stage" -path '*kyn_assistant/__init__.py' | head -n1)")
+[[ "$(PYTHONPATH=$(dirname "$module") python3 -c 'import kyn_assistant; print(kyn_assistant.Plugin().version)')" == "$version" ]] ||
+  fail "the installed Python module does not load the plug-in"
+
 # The installed host loads the installed plug-in by itself and answers from the installed kyn-sim.
 output=$("$source/scripts/demo" "$stage")
 grep -q "Ada Marlowe — Work" <<<"$output" || fail "the installed host did not answer: $output"
