@@ -126,6 +126,11 @@ class Plugin:
         lib.kyn_plugin_find_people.argtypes = [ctypes.c_char_p]
         lib.kyn_plugin_find_person.argtypes = [ctypes.c_char_p]
         lib.kyn_plugin_free.argtypes = [ctypes.c_void_p]
+        lib.kyn_plugin_sign_in.argtypes = [ctypes.c_char_p] * 4
+        lib.kyn_plugin_sign_in.restype = ctypes.c_int
+        lib.kyn_plugin_account.restype = ctypes.c_void_p
+        lib.kyn_plugin_account.argtypes = []
+        lib.kyn_plugin_sign_out.restype = ctypes.c_int
         lib.kyn_plugin_shutdown.argtypes = []
 
     # ---- life ----
@@ -159,6 +164,28 @@ class Plugin:
     def language(self) -> str:
         """The assistant's language in effect."""
         return self._take(self._lib.kyn_plugin_language()) or ""
+
+    # ---- account ----
+
+    _SIGN_IN_PROBLEMS = {1: "the person id", 2: "the user name", 3: "the host (HOST or HOST:PORT)", 4: "the token"}
+
+    def sign_in(self, person_id: str, username: str, host: str, token: str) -> None:
+        """Signs an account in (account.json and the owner-only token file). Wrong input raises
+        ValueError and leaves the previous account as it was."""
+        result = self._lib.kyn_plugin_sign_in(person_id.encode(), username.encode(), host.encode(), token.encode())
+        if result in self._SIGN_IN_PROBLEMS:
+            raise ValueError(f"{self._SIGN_IN_PROBLEMS[result]} cannot be stored; the account is unchanged")
+        if result != 0:
+            raise KynError("the account could not be written; the previous account is unchanged")
+
+    def account(self) -> Optional[dict]:
+        """The signed-in account without its token, or None."""
+        text = self._take(self._lib.kyn_plugin_account())
+        return json.loads(text) if text else None
+
+    def sign_out(self) -> bool:
+        """Signs out; False when no one was signed in."""
+        return self._lib.kyn_plugin_sign_out() == 0
 
     # ---- commands ----
 

@@ -80,10 +80,17 @@ class PluginAgainstSim(unittest.TestCase):
             Plugin(os.path.join(self.work.name, "missing"))
 
 
-class ClosedPlugin(unittest.TestCase):
-    def test_a_closed_plugin_refuses_commands(self):
+class AccountAndClosedPlugin(unittest.TestCase):
+    def test_sign_in_show_and_out_then_a_closed_plugin_refuses_commands(self):
         with tempfile.TemporaryDirectory() as config:
             plugin = Plugin(config)
+            with self.assertRaises(ValueError):
+                plugin.sign_in("P-1", "sam", "https://example.com/", "t0k")
+            self.assertIsNone(plugin.account())
+            plugin.sign_in("P-1", "sam", "example.com:8443", "t0k")
+            self.assertEqual(plugin.account()["serviceHost"], "example.com:8443")
+            self.assertNotIn("t0k", json.dumps(plugin.account()))
+            self.assertTrue(plugin.sign_out())
             plugin.close()
             with self.assertRaises(KynError):
                 plugin.search(here=(1.0, 2.0))

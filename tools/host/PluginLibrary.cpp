@@ -29,6 +29,9 @@ PluginLibrary::PluginLibrary(const std::filesystem::path& path) {
   resolve(describeLocation, "kyn_plugin_describe_location");
   resolve(findPeople, "kyn_plugin_find_people");
   resolve(findPerson, "kyn_plugin_find_person");
+  resolve(signIn, "kyn_plugin_sign_in");
+  resolve(account, "kyn_plugin_account");
+  resolve(signOut, "kyn_plugin_sign_out");
   resolve(free, "kyn_plugin_free");
   resolve(shutdown, "kyn_plugin_shutdown");
 }

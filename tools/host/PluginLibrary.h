@@ -36,6 +36,9 @@ class PluginLibrary {
   decltype(&kyn_plugin_describe_location) describeLocation = nullptr;
   decltype(&kyn_plugin_find_people) findPeople = nullptr;
   decltype(&kyn_plugin_find_person) findPerson = nullptr;
+  decltype(&kyn_plugin_sign_in) signIn = nullptr;
+  decltype(&kyn_plugin_account) account = nullptr;
+  decltype(&kyn_plugin_sign_out) signOut = nullptr;
   decltype(&kyn_plugin_free) free = nullptr;
   decltype(&kyn_plugin_shutdown) shutdown = nullptr;
 

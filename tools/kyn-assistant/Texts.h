@@ -35,6 +35,24 @@ enum class Text {
   BadHere,           // %s: the text given
   BadPlaceAt,        // %s: the text given
   CannotRead,        // %s: the file
+  TokenPrompt,
+  SignedIn,          // %s: person id, %s: host
+  BadPersonId,       // %s: what was given
+  BadUsername,       // %s: what was given
+  BadHost,           // %s: what was given
+  BadToken,
+  NotWritten,
+  NoOneSignedIn,
+  SignedOut,
+  AccountPerson,     // %s
+  AccountUsername,   // %s
+  AccountHost,       // %s
+  TokenReadable,
+  TokenUnreadable,
+  AccountProvisioned,  // %s: yes or no
+  AccountRestricted,   // %s: yes or no
+  Yes,
+  No,
   Count
 };
 

@@ -33,6 +33,27 @@ struct AccountFile {
 /// token is none. The token itself is never logged.
 [[nodiscard]] std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile);
 
+/// What signing in stores: the account and its application token.
+struct SignIn {
+  std::string personId;
+  std::string username;
+  std::string serviceHost;  ///< host or host:port, no scheme
+  std::string token;        ///< a secret: never logged, never in a message
+};
+
+/// What is wrong with a sign-in, field by field; the first problem decides.
+enum class SignInProblem { None, PersonId, Username, ServiceHost, Token };
+[[nodiscard]] SignInProblem checkSignIn(const SignIn& signIn);
+
+/// Stores a checked sign-in in `directory` (made, owner-only, when missing): account.json and the
+/// owner-only token file, each written completely under a fixed temporary name, flushed and renamed
+/// over the old file, so that a failure or a crash leaves the old file or the new one. Returns
+/// whether both were written; the reason of a failure is logged.
+[[nodiscard]] bool writeSignIn(const std::filesystem::path& directory, const SignIn& signIn);
+
+/// Removes account.json and the token file of `directory`; false when neither was there.
+bool removeSignIn(const std::filesystem::path& directory);
+
 /// Linux: the account from the configuration directory; device facts from the machine id (an
 /// application-specific derivation; the raw id never leaves the machine), DMI, os-release and uname.
 class LinuxSystemInfo final : public SystemInfo {
