@@ -47,8 +47,9 @@ Services::Services()
       }),
       postalAddressFormatter([this] {
         // Region and language are read on every call: either service may be replaced meanwhile.
-        return std::make_shared<TablePostalAddressFormatter>([this] { return locale.get()->countryCode(); },
-                                                             [this] { return assistantPreferences.get()->languageCode(); });
+        return std::make_shared<TablePostalAddressFormatter>(
+            [this] { return locale.get()->countryCode(); },
+            [this] { return assistantPreferences.get()->languageCode(); });
       }) {}
 
 std::shared_ptr<const Configuration> Services::configuration() {

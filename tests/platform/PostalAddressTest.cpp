@@ -44,8 +44,8 @@ TEST_F(PostalAddressTest, MailingAddressesByTheConventionsOfTheirCountry) {
       {"no country, another region", {"Hauptstr. 5", "Köln", "NW", "50667", {}}, "en_US", "en-US",
        "Hauptstr. 5\nKÖLN, NW 50667"},
       {"only a country", {{}, {}, {}, {}, "CA"}, "en_US", "en-US", "Canada"},
-      {"a country that is no code: default layout, kept as written", {"Hauptstr. 5", "Köln", {}, "50667", "Deutschland"},
-       "en_US", "en-US", "Hauptstr. 5\nKöln\n50667\nDeutschland"},
+      {"a country that is no code: default layout, kept as written",
+       {"Hauptstr. 5", "Köln", {}, "50667", "Deutschland"}, "en_US", "en-US", "Hauptstr. 5\nKöln\n50667\nDeutschland"},
       {"empty address", {}, "en_US", "en-US", ""},
   };
   auto& s = services();

@@ -42,11 +42,8 @@ const AddressFormat* formatFor(std::string_view country) {
   return it != std::end(kFormats) && it->country == country ? it : nullptr;
 }
 
-/// The upper-case ISO code in `text` ("de", " US "), or nothing when it holds no two-letter code.
+/// The upper-case ISO code that `text` is ("de", "US"), or nothing when it is no two-letter code.
 std::optional<std::string> isoCountryCode(std::string_view text) {
-  const auto first = text.find_first_not_of(" \t");
-  if (first == std::string_view::npos) return std::nullopt;
-  text = text.substr(first, text.find_last_not_of(" \t") - first + 1);
   const auto isLetter = [](char c) { return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z'); };
   if (text.size() != 2 || !isLetter(text[0]) || !isLetter(text[1])) return std::nullopt;
   std::string code(text);
@@ -121,7 +118,8 @@ icu::UnicodeString renderLine(std::string_view line, const Fields& fields, bool 
   bool wroteField = false;
   bool lastWritten = false;
   for (std::size_t i = 0; i < line.size(); ++i) {
-    const auto letter = i + 1 < line.size() && line[i] == '%' ? kFieldLetters.find(line[i + 1]) : std::string_view::npos;
+    const auto letter =
+        i + 1 < line.size() && line[i] == '%' ? kFieldLetters.find(line[i + 1]) : std::string_view::npos;
     if (letter == std::string_view::npos) {
       literal += line[i];
       continue;
