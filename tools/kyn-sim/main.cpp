@@ -69,7 +69,7 @@ std::string urlHost(const std::string& address) {
 }
 
 // `kyn-sim move`: a client of the running server's control path.
-int move(const std::string& controlFile, const std::string& handle, double latitude, double longitude,
+int runMove(const std::string& controlFile, const std::string& handle, double latitude, double longitude,
          std::optional<double> accuracy) {
   kyn::sim::ControlAccess access;
   try {
@@ -152,7 +152,7 @@ int main(int argc, char** argv) {
     const int status = app.exit(e);
     return status == 0 ? 0 : kStartupFailure;
   }
-  if (moveCommand->parsed()) return move(moveControl, moveHandle, moveLatitude, moveLongitude, moveAccuracy);
+  if (moveCommand->parsed()) return runMove(moveControl, moveHandle, moveLatitude, moveLongitude, moveAccuracy);
 
   // Signals are taken by sigwait below; block them before any thread starts so none inherits them.
   sigset_t stopSignals;
