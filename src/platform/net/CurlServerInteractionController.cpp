@@ -221,6 +221,11 @@ class Engine : public std::enable_shared_from_this<Engine> {
     if (std::filesystem::is_directory("/etc/ssl/certs", ec)) systemCaPath_ = "/etc/ssl/certs";
   }
 
+  ~Engine() {
+    // Only a send after `stop` could have started another thread; it has ended by now, or this is it.
+    if (thread_.joinable()) thread_.detach();
+  }
+
   void send(Request request) {
     std::unique_lock lock(mutex_);
     queue_.push_back(std::move(request));
@@ -305,6 +310,11 @@ class Engine : public std::enable_shared_from_this<Engine> {
         incoming.swap(queue_);
         stopping = stopping_;
       }
+      for (auto& request : incoming) {
+        if (request.refusal != KYTransferError::None) fail(request, request.refusal, request.refusalDetail);
+        else if (stopping) fail(request, KYTransferError::Cancelled, "the transport shut down");
+        else begin(std::move(request), active);
+      }
       if (stopping) {
         for (auto& [easy, transfer] : active) {
           const auto command = transfer->request.command;
@@ -312,12 +322,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
           transfer.reset();
           fail(command, url, KYTransferError::Cancelled, "the transport shut down");
         }
-        for (auto& request : incoming) fail(request, KYTransferError::Cancelled, "the transport shut down");
         return;
-      }
-      for (auto& request : incoming) {
-        if (request.refusal != KYTransferError::None) fail(request, request.refusal, request.refusalDetail);
-        else begin(std::move(request), active);
       }
       if (multi_) {
         int running = 0;
