@@ -12,6 +12,7 @@
 
 #include <algorithm>
 #include <charconv>
+#include <climits>
 #include <condition_variable>
 #include <deque>
 #include <filesystem>
@@ -222,7 +223,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
   }
 
   ~Engine() {
-    // Only a send after `stop` could have started another thread; it has ended by now, or this is it.
+    // `stop` leaves no thread behind; should one have been started after it, it ends on its own.
     if (thread_.joinable()) thread_.detach();
   }
 
