@@ -490,16 +490,22 @@ class CurlServerInteractionController final : public KYServerInteractionControll
       request.refusal = KYTransferError::NotSent;
       request.refusalDetail = "only https is sent";
     } else {
-      request.body = toJson(command->jsonBodyDictionary());
-      const Value headers = command->headers();  // iterated below: must outlive the loop
-      for (const auto& [name, value] : headers.items()) {
-        request.headers.push_back(name + ": " + (value.is_string() ? value.get<std::string>() : toJson(value)));
+      try {
+        request.body = toJson(command->jsonBodyDictionary());
+        const Value headers = command->headers();  // iterated below: must outlive the loop
+        for (const auto& [name, value] : headers.items()) {
+          request.headers.push_back(name + ": " + (value.is_string() ? value.get<std::string>() : toJson(value)));
+        }
+        request.headers.emplace_back("Content-Type: application/json");
+        request.headers.emplace_back("Accept: application/json");
+        request.headers.emplace_back("Expect:");
+        request.username = command->username();
+        request.password = command->password();
+      } catch (const std::exception& e) {
+        // The command could not say what to send: it is still answered, from the network thread.
+        request.refusal = KYTransferError::NotSent;
+        request.refusalDetail = e.what();
       }
-      request.headers.emplace_back("Content-Type: application/json");
-      request.headers.emplace_back("Accept: application/json");
-      request.headers.emplace_back("Expect:");
-      request.username = command->username();
-      request.password = command->password();
     }
     engine_->send(std::move(request));
   }
