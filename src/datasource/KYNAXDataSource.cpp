@@ -2,6 +2,7 @@
 
 #include "account/Common.h"
 #include "commands/GetLocationsCmd.h"
+#include "datasource/ReplyCallback.h"
 #include "platform/Services.h"
 #include "platform/resources/Resources.h"
 #include "utils/KYNAXUtils.h"
@@ -71,19 +72,10 @@ void KYNAXDataSource::search(const AXKynSearch& command, AXCompletion completion
   request->friends = command.friends;
   request->proximity = command.proximity;
 
-  // The callback holds the command and the command holds the callback; the callback's last act
-  // breaks that cycle, whatever the assistant's completion does.
-  auto callback = [request, completion = std::move(completion)] {
-    struct ClearOnExit {
-      GetLocationsCmd& command;
-      ~ClearOnExit() { command.setCompletionBlock(nullptr); }
-    } clear{*request};
-    const auto reply = searchReply(*request);
-    if (completion) completion(reply->dictionary());
-  };
+  auto callback = replyCallback(request, std::move(completion), &searchReply);
   auto controller = serverInteractionController();
   if (!controller) {
-    // Only reachable after the plug-in was shut down: answer rather than leave the assistant waiting.
+    // Only a C++ host that took the controller away gets here: answer rather than leave it waiting.
     request->setCompletionBlock(callback);
     callback();
     return;

@@ -23,6 +23,8 @@ namespace {
 using platform::services;
 
 constexpr std::size_t kMaxCommandBytes = 1u << 20;
+/// The reply when not even a reply can be made.
+constexpr const char* kInternalErrorReply = R"({"class":"AXCommandFailed","reason":"Internal error"})";
 
 /// Delivers the one reply of a command to the host; a second attempt is dropped and logged.
 class ReplyOnce {
@@ -34,8 +36,14 @@ class ReplyOnce {
       services().log().error("A second reply to one command was dropped: %@", reply);
       return;
     }
-    const std::string text = platform::toJson(reply);
     try {
+      std::string text;
+      try {
+        text = platform::toJson(reply);
+      } catch (...) {
+        // No memory for the text: the assistant still gets its one reply.
+        return callback_(kInternalErrorReply, context_);
+      }
       callback_(text.c_str(), context_);
     } catch (...) {
       services().log().error("The assistant's reply callback failed");
@@ -173,10 +181,10 @@ int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void*
     plugin::perform(command_json, once);
   } catch (const std::exception& e) {
     if (once) once->fail(std::string("Internal error: ") + e.what());
-    else reply(R"({"class":"AXCommandFailed","reason":"Internal error"})", context);
+    else reply(plugin::kInternalErrorReply, context);
   } catch (...) {
     if (once) once->fail("Internal error");
-    else reply(R"({"class":"AXCommandFailed","reason":"Internal error"})", context);
+    else reply(plugin::kInternalErrorReply, context);
   }
   return 0;
 }

@@ -1,5 +1,6 @@
 #include "commands/GetLocationsCmd.h"
 #include "datasource/KYNAXDataSource.h"
+#include "datasource/ReplyCallback.h"
 #include "support/FakeContactStore.h"
 #include "support/FakeController.h"
 #include "support/PlatformTest.h"
@@ -114,6 +115,17 @@ TEST_F(KYNAXDataSourceTest, TheCycleIsBrokenEvenWhenTheAssistantsCompletionThrow
   controller = std::make_shared<test::FakeController>();
   KYNAXDataSource::dataSource().setServerInteractionController(controller);  // drops the sent list
   EXPECT_TRUE(weak.expired()) << "the command leaked";
+}
+
+TEST_F(KYNAXDataSourceTest, AReplyThatCannotBeMadeIsStillOneFailure) {
+  auto command = std::make_shared<GetLocationsCmd>();
+  std::vector<Value> replies;
+  command->setCompletionBlock(replyCallback(command, [&](const Value& r) { replies.push_back(r); },
+                                            [](GetLocationsCmd&) -> std::shared_ptr<AXObject> { throw std::bad_alloc(); }));
+  test::completeCommand(command, {});
+  ASSERT_EQ(replies.size(), 1u);
+  EXPECT_EQ(replies[0]["errorCode"], AXKynServiceNotAvailableErrorCode);
+  EXPECT_FALSE(command->completionBlock());
 }
 
 TEST_F(KYNAXDataSourceTest, WithoutAControllerTheSearchIsStillAnswered) {

@@ -3,6 +3,7 @@
 #include "platform/log/Log.h"
 #include "platform/value/Json.h"
 
+#include <algorithm>
 #include <cmath>
 #include <cstdlib>
 #include <fstream>
@@ -67,15 +68,25 @@ Configuration Configuration::load(const std::filesystem::path& directory) {
     }
   };
 
+  // Time limits in milliseconds; a fraction is rounded up, so that nothing below one millisecond
+  // turns into no limit at all.
+  auto readMilliseconds = [&](std::string_view key, std::chrono::milliseconds& limit) {
+    const Value* v = member(*json, key);
+    if (v == nullptr) return;
+    const auto n = numberValue(v);
+    if (!n || !std::isfinite(*n) || *n >= 1e12) return wrongType(key);
+    if (*n < 0) {
+      Log::shared().error("Configuration field %@ in %@ is negative; using its default", key, file.string());
+      return;
+    }
+    limit = std::chrono::milliseconds(std::max(1LL, static_cast<long long>(std::ceil(*n))));
+  };
+
   readString("caFile", [&](const std::string& s) { c.transport_.caFile = resolve(directory, s); });
   readString("contacts", [&](const std::string& s) { c.contactsPath_ = resolve(directory, s); });
   readString("language", [&](const std::string& s) { c.language_ = s; });
-  readPositive("connectTimeoutMs", [&](double n) {
-    c.transport_.connectTimeout = std::chrono::milliseconds(static_cast<long long>(n));
-  });
-  readPositive("totalTimeoutMs", [&](double n) {
-    c.transport_.totalTimeout = std::chrono::milliseconds(static_cast<long long>(n));
-  });
+  readMilliseconds("connectTimeoutMs", c.transport_.connectTimeout);
+  readMilliseconds("totalTimeoutMs", c.transport_.totalTimeout);
   readPositive("maxResponseBytes", [&](double n) { c.transport_.maxResponseBytes = static_cast<std::size_t>(n); });
   if (const Value* v = member(*json, "maxRedirects")) {
     auto n = numberValue(v);

@@ -4,6 +4,24 @@
 
 namespace kyn::platform {
 
+std::string_view describeTransferError(KYTransferError error) noexcept {
+  switch (error) {
+    case KYTransferError::None: return "succeeded";
+    case KYTransferError::NotSent: return "not sent";
+    case KYTransferError::NoHost: return "no server host";
+    case KYTransferError::HostNotFound: return "host not found";
+    case KYTransferError::Refused: return "connection refused";
+    case KYTransferError::TimedOut: return "timed out";
+    case KYTransferError::TLS: return "TLS failure";
+    case KYTransferError::ResponseTooLarge: return "response too large";
+    case KYTransferError::RedirectRefused: return "redirect refused";
+    case KYTransferError::HTTPStatus: return "HTTP error status";
+    case KYTransferError::ConnectionFailed: return "connection failed";
+    case KYTransferError::Cancelled: return "cancelled at shutdown";
+  }
+  return "unknown failure";
+}
+
 std::string KYJSONCommand::path() const { return "/"; }
 
 Value KYJSONCommand::headers() const { return Value::object(); }
@@ -41,6 +59,10 @@ void KYJSONCommand::runCompletionBlock() noexcept {
 std::string KYJSONCommand::description() const {
   std::string out = "<" + std::string(commandName()) + " POST " + url().value_or("(no host)" + path());
   if (response_) out += " HTTP " + std::to_string(response_->statusCode);
+  if (error_ != KYTransferError::None && error_ != KYTransferError::NotSent) {
+    out += " ";
+    out += describeTransferError(error_);
+  }
   if (redirected_) out += " redirected to " + redirectedHost_.value_or("(null)");
   out += ">";
   return out;

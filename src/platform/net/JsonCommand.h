@@ -20,6 +20,25 @@ struct HTTPResponse {
   std::int64_t statusCode = 0;
 };
 
+/// Why an exchange did not end with a 2xx answer.
+enum class KYTransferError {
+  None,              ///< a 2xx answer arrived
+  NotSent,           ///< the request never left: not sent yet, or no transfer could be started
+  NoHost,            ///< there is no server host to send to
+  HostNotFound,      ///< the host name does not resolve
+  Refused,           ///< the host refused the connection: nothing listens on that port
+  TimedOut,          ///< the connect or the total time limit ran out
+  TLS,               ///< the TLS handshake failed: an untrusted, expired or mismatched certificate
+  ResponseTooLarge,  ///< the answer is larger than the transport accepts
+  RedirectRefused,   ///< a redirect to a scheme other than https, a loop, or more redirects than allowed
+  HTTPStatus,        ///< the server answered with a status other than 2xx
+  ConnectionFailed,  ///< the connection broke: reset, an answer cut short, a protocol error
+  Cancelled,         ///< the transport shut down before the exchange ended
+};
+
+/// The error in a few words ("connection refused"), for log lines and descriptions.
+[[nodiscard]] std::string_view describeTransferError(KYTransferError error) noexcept;
+
 /// A JSON request to a server and, once sent, its outcome. Subclasses supply the path, headers and
 /// body and read the parsed response. A command is used by one thread at a time: built on the
 /// caller's thread, filled in by the transport, read in its completion.
@@ -57,7 +76,10 @@ class KYJSONCommand : public Object {
   /// The minimum interval, in seconds, the server asked for between calls; 0 unless overridden.
   [[nodiscard]] virtual double minCallbackInterval();
   /// The exchange completed with an HTTP 2xx status.
-  [[nodiscard]] bool wasSuccessful() const noexcept { return successful_; }
+  [[nodiscard]] bool wasSuccessful() const noexcept { return error_ == KYTransferError::None; }
+  /// Why the exchange failed (`None` when it succeeded), and the transport's own words on it.
+  [[nodiscard]] KYTransferError transferError() const noexcept { return error_; }
+  [[nodiscard]] const std::string& transferErrorDetail() const noexcept { return errorDetail_; }
   /// The HTTP response, when one arrived.
   [[nodiscard]] const std::optional<HTTPResponse>& response() const noexcept { return response_; }
   [[nodiscard]] bool wasRedirected() const noexcept { return redirected_; }
@@ -65,9 +87,17 @@ class KYJSONCommand : public Object {
   [[nodiscard]] const std::optional<std::string>& redirectedHostname() const noexcept { return redirectedHost_; }
 
   // ---- Filled in by the transport (and by tests) ----
-  void setTransferResult(bool successful, std::optional<HTTPResponse> response) {
-    successful_ = successful;
+  void setTransferResult(KYTransferError error, std::optional<HTTPResponse> response, std::string detail = {}) {
+    error_ = error;
     response_ = response;
+    errorDetail_ = std::move(detail);
+  }
+  /// A success, or a failure taken as an HTTP error when there is a response.
+  void setTransferResult(bool successful, std::optional<HTTPResponse> response) {
+    setTransferResult(successful  ? KYTransferError::None
+                      : response ? KYTransferError::HTTPStatus
+                                 : KYTransferError::ConnectionFailed,
+                      response);
   }
   /// Keeps the response body, parsed within `limits`; a body that is not a JSON object reads as none.
   void setResponseBody(std::string_view body, const JsonLimits& limits = {});
@@ -96,7 +126,8 @@ class KYJSONCommand : public Object {
   std::optional<std::string> username_;
   std::optional<std::string> password_;
 
-  bool successful_ = false;
+  KYTransferError error_ = KYTransferError::NotSent;
+  std::string errorDetail_;
   std::optional<HTTPResponse> response_;
   std::optional<Value> parsedResponse_;
   bool redirected_ = false;

@@ -17,17 +17,20 @@ struct Fault {
     Garbage,   ///< HTTP 200 with random bytes that are no JSON
     Body,      ///< HTTP 200 with the bytes of `bodyPath`, read afresh for every request
     Truncate,  ///< announce more body bytes than are sent, then drop the connection
+    Redirect,  ///< 307 to `location`, whatever it names
   };
   Kind kind = Kind::None;
   int status = 0;
   std::chrono::milliseconds delay{0};
   std::filesystem::path bodyPath;
+  std::string location;
 
   /// The fault as written on the command line ("status:500"); empty for none.
   [[nodiscard]] std::string describe() const;
 };
 
-/// Parses "status:CODE" (200 to 599), "slow:MS", "reset", "garbage", "body:PATH" or "truncate".
+/// Parses "status:CODE" (200 to 599), "slow:MS", "reset", "garbage", "body:PATH", "truncate" or
+/// "redirect:URL".
 /// Throws std::invalid_argument with the accepted forms on anything else.
 [[nodiscard]] Fault parseFault(std::string_view text);
 

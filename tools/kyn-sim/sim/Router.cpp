@@ -36,6 +36,15 @@ std::string garbage() {
   return out;
 }
 
+Reply redirectReply(std::string location) {
+  Reply r;
+  r.status = 307;
+  r.contentType = "text/plain";
+  r.body = "Temporary Redirect\n";
+  r.headers.emplace_back("Location", std::move(location));
+  return r;
+}
+
 }  // namespace
 
 Reply errorReply(int status, std::string_view message) {
@@ -162,6 +171,9 @@ Router::FaultPlan Router::planFault() {
     case Fault::Kind::Truncate:
       plan.delivery = Reply::Delivery::Truncate;  // the real answer, cut short
       return plan;
+    case Fault::Kind::Redirect:
+      r = redirectReply(f.location);
+      break;
   }
   plan.replaces = true;
   return plan;
@@ -183,10 +195,7 @@ Outcome Router::handle(const Call& call, std::int64_t nowMs) {
 
   if (options_.canonicalHost && !control) {
     if (auto location = redirectLocation(call.host, *options_.canonicalHost, port_, call.target)) {
-      out.reply.status = 307;
-      out.reply.contentType = "text/plain";
-      out.reply.body = "Temporary Redirect\n";
-      out.reply.headers.emplace_back("Location", std::move(*location));
+      out.reply = redirectReply(std::move(*location));
       return out;
     }
   }

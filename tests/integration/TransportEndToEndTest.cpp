@@ -1,0 +1,260 @@
+// The HTTPS transport against kyn-sim: why each failed exchange failed, which redirects count, and
+// on which thread a command is answered. The transport is driven directly where the test needs to
+// see the command, and through the loaded plug-in where the test needs the stored host or the reply.
+#include "Harness.h"
+
+#include "platform/net/ServerInteractionController.h"
+#include "platform/notify/NotificationCenter.h"
+
+#include <gtest/gtest.h>
+
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <fstream>
+#include <thread>
+
+namespace kyn::itest {
+namespace {
+
+using platform::KYTransferError;
+using namespace std::chrono_literals;
+
+constexpr const char* kPath = "/kytrservice/friends/va/getlocations";
+const Json kNoFriends = Json::parse(R"({"friends": {}})");
+
+/// A loopback port on which nothing listens: bound once to learn a free number, then closed.
+int closedPort() {
+  const int fd = socket(AF_INET, SOCK_STREAM, 0);
+  sockaddr_in address{};
+  address.sin_family = AF_INET;
+  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+  socklen_t length = sizeof address;
+  if (fd < 0 || bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 ||
+      getsockname(fd, reinterpret_cast<sockaddr*>(&address), &length) != 0) {
+    throw std::runtime_error("no free port");
+  }
+  close(fd);
+  return ntohs(address.sin_port);
+}
+
+std::string localhost(int port) { return "localhost:" + std::to_string(port); }
+
+/// A get-locations request with the test account's credentials, for the transport alone.
+class Probe final : public platform::KYJSONCommand {
+ public:
+  explicit Probe(std::string host) {
+    setHost(std::move(host));
+    setUsername(kPersonId);
+    setPassword(kToken);
+  }
+  [[nodiscard]] std::string path() const override { return kPath; }
+  [[nodiscard]] kyn::Value jsonBodyDictionary() const override {
+    return {{"clientContext", kyn::Value::object()}};
+  }
+};
+
+/// What one exchange ended with, as its completion saw it.
+struct Ended {
+  std::shared_ptr<Probe> command;
+  int completions = 0;
+  int redirectNotices = 0;
+  bool answeredOnCallerThread = false;
+};
+
+/// Sends one command with a controller of its own. With `waitForAnswer`, waits for the completion
+/// before the controller goes; otherwise the controller goes at once, taking the exchange with it.
+Ended exchange(const std::string& host, const platform::TransportSettings& settings, bool waitForAnswer = true) {
+  Ended ended{std::make_shared<Probe>(host)};
+  std::mutex mutex;
+  std::condition_variable answered;
+  auto& center = platform::NotificationCenter::defaultCenter();
+  const auto observer = center.addObserver(std::string(platform::KYCommandRedirectedNotification),
+                                           [&](const platform::Notification& n) {
+                                             std::lock_guard lock(mutex);
+                                             if (n.object == ended.command) ++ended.redirectNotices;
+                                           });
+  {
+    auto controller = platform::makeServerInteractionController(settings);
+    const auto caller = std::this_thread::get_id();
+    controller->sendCommand(ended.command, [&] {
+      std::lock_guard lock(mutex);
+      ++ended.completions;
+      ended.answeredOnCallerThread = std::this_thread::get_id() == caller;
+      answered.notify_all();
+    });
+    if (waitForAnswer) {
+      std::unique_lock lock(mutex);
+      answered.wait_for(lock, 60s, [&] { return ended.completions > 0; });
+    }
+  }  // the controller ends its network thread: every completion there will be has run
+  center.removeObserver(observer);
+  ended.command->setCompletionBlock(nullptr);
+  return ended;
+}
+
+// Behind every "service not available" there is a reason that tells a wrong host from an expired
+// certificate. Each is answered on the network thread, also when no exchange took place.
+TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
+  struct Case {
+    const char* name;
+    std::vector<std::string> simArgs = {};
+    KYTransferError expected;
+    std::optional<std::int64_t> http = {};
+    std::optional<std::string> host = {};  // instead of the simulator's
+    bool trustSim = true;
+    bool cutShort = false;  // the controller goes while the exchange runs
+    std::size_t maxResponseBytes = 1u << 20;
+    std::chrono::milliseconds totalTimeout = 15s;
+  };
+  const std::vector<Case> cases = {
+      {.name = "answered", .expected = KYTransferError::None, .http = 200},
+      {.name = "no host", .expected = KYTransferError::NoHost, .host = ""},
+      {.name = "nothing listens", .expected = KYTransferError::Refused, .host = localhost(closedPort())},
+      // 0 ms would be no limit at all to curl: the slow answer would come after 20 s.
+      {.name = "a limit of 0 ms", .simArgs = {"--fault", "slow:20000"}, .expected = KYTransferError::TimedOut,
+       .totalTimeout = 0ms},
+      {.name = "untrusted certificate", .expected = KYTransferError::TLS, .trustSim = false},
+      {.name = "too large", .expected = KYTransferError::ResponseTooLarge, .maxResponseBytes = 16},
+      {.name = "server error", .simArgs = {"--fault", "status:503"}, .expected = KYTransferError::HTTPStatus,
+       .http = 503},
+      {.name = "shut down", .simArgs = {"--fault", "slow:20000"}, .expected = KYTransferError::Cancelled,
+       .cutShort = true},
+  };
+  for (const auto& c : cases) {
+    test::TempDir dir;
+    Sim sim(dir.path(), kNoFriends, c.simArgs);
+    platform::TransportSettings settings;
+    if (c.trustSim) settings.caFile = sim.caFile();
+    settings.maxResponseBytes = c.maxResponseBytes;
+    settings.totalTimeout = c.totalTimeout;
+    const auto ended = exchange(c.host.value_or(localhost(sim.port())), settings, !c.cutShort);
+    const auto& command = *ended.command;
+    EXPECT_EQ(ended.completions, 1) << c.name;
+    EXPECT_FALSE(ended.answeredOnCallerThread) << c.name;
+    EXPECT_EQ(command.transferError(), c.expected) << c.name << ": " << command.transferErrorDetail();
+    EXPECT_EQ(command.wasSuccessful(), c.expected == KYTransferError::None) << c.name;
+    if (c.http) {
+      EXPECT_EQ(command.response() ? command.response()->statusCode : 0, *c.http) << c.name;
+    }
+    EXPECT_FALSE(command.wasRedirected()) << c.name;
+  }
+}
+
+// The host a server redirects to is stored and serves every later command, so a redirect counts only
+// when that host answered over verified TLS. One that leads nowhere leaves the stored host as it was.
+TEST(TransportEndToEnd, ARedirectCountsOnlyWhenTheNewHostAnswered) {
+  test::TempDir targetDir;
+  Sim target(targetDir.path(), kNoFriends);  // answers every request: "no friends"
+  const std::string toTarget = "https://" + localhost(target.port()) + kPath;
+  struct Case {
+    const char* name;
+    std::vector<std::string> simArgs = {};
+    KYTransferError expected;
+    bool counts = false;
+    bool trustTarget = true;
+    long maxRedirects = 5;
+  };
+  const std::vector<Case> cases = {
+      {.name = "to a host that answers", .simArgs = {"--fault", "redirect:" + toTarget},
+       .expected = KYTransferError::None, .counts = true},
+      {.name = "to a closed port",
+       .simArgs = {"--fault", "redirect:https://" + localhost(closedPort()) + kPath},
+       .expected = KYTransferError::Refused},
+      {.name = "to plain http", .simArgs = {"--fault", "redirect:http://" + localhost(target.port()) + kPath},
+       .expected = KYTransferError::RedirectRefused},
+      {.name = "to an untrusted certificate", .simArgs = {"--fault", "redirect:" + toTarget},
+       .expected = KYTransferError::TLS, .trustTarget = false},
+      // Off to 127.0.0.1, which answers with a redirect to itself, again and again.
+      {.name = "in a loop", .simArgs = {"--canonical-host", "127.0.0.1", "--fault", std::string("redirect:") + kPath},
+       .expected = KYTransferError::RedirectRefused},
+      {.name = "more often than allowed",
+       .simArgs = {"--canonical-host", "127.0.0.1", "--fault", "redirect:" + toTarget},
+       .expected = KYTransferError::RedirectRefused, .maxRedirects = 1},
+  };
+  for (const auto& c : cases) {
+    test::TempDir simDir;
+    test::TempDir configDir;
+    Sim sim(simDir.path(), kNoFriends, c.simArgs);
+    const auto trusted = configDir.path() / "trusted.pem";
+    {
+      std::ofstream bundle(trusted);
+      bundle << std::ifstream(sim.caFile()).rdbuf();
+      if (c.trustTarget) bundle << std::ifstream(target.caFile()).rdbuf();
+    }
+
+    platform::TransportSettings settings;
+    settings.caFile = trusted;
+    settings.maxRedirects = c.maxRedirects;
+    const auto ended = exchange(localhost(sim.port()), settings);
+    const auto& command = *ended.command;
+    EXPECT_EQ(ended.completions, 1) << c.name;
+    EXPECT_EQ(command.transferError(), c.expected) << c.name << ": " << command.transferErrorDetail();
+    EXPECT_EQ(command.wasRedirected(), c.counts) << c.name;
+    EXPECT_EQ(ended.redirectNotices, c.counts ? 1 : 0) << c.name;
+    if (c.counts) {
+      EXPECT_EQ(command.redirectedHostname(), localhost(target.port())) << c.name;
+    }
+
+    // Through the plug-in, with the same host stored by an earlier redirect.
+    const std::string stored = localhost(sim.port());
+    const auto preferences = configDir.path() / "preferences" / "com.zanto.tessel.kyn.assistant.json";
+    std::filesystem::create_directories(preferences.parent_path());
+    std::ofstream(preferences) << Json{{"RedirectedHostKey", stored}}.dump();
+    Account(configDir.path()).write("127.0.0.1:" + std::to_string(sim.port()), trusted, Json{{"maxRedirects", c.maxRedirects}});
+    Plugin plugin;
+    plugin.configure(configDir.path());
+    const auto outcome = plugin.perform(searchFor({"ada@example.com"}));
+    EXPECT_EQ(outcome.replies, 1) << c.name;
+    // The target's answer is "no friends"; every failed redirect is "service not available".
+    EXPECT_EQ(outcome.reply.value_or(Json())["errorCode"], c.counts ? 1007 : 1005) << c.name;
+    EXPECT_EQ(Json::parse(std::ifstream(preferences))["RedirectedHostKey"],
+              c.counts ? localhost(target.port()) : stored)
+        << c.name;
+    for (const auto& line : plugin.logLines()) EXPECT_EQ(line.find(kToken), std::string::npos) << line;
+  }
+}
+
+// A host may wait on a lock inside its reply callback that it holds around kyn_plugin_perform: a
+// command that reaches the data source must be answered on the network thread, after the call.
+TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
+  struct Box {
+    std::mutex mutex;
+    std::condition_variable changed;
+    bool performReturned = false;
+    bool replied = false;
+    bool afterReturn = false;
+    std::thread::id thread;
+    Json reply;
+  };
+  auto receive = [](const char* json, void* context) {
+    auto* box = static_cast<Box*>(context);
+    std::unique_lock lock(box->mutex);
+    // Answered inside the call, this wait would give up: the caller cannot return meanwhile.
+    box->afterReturn = box->changed.wait_for(lock, 10s, [&] { return box->performReturned; });
+    box->thread = std::this_thread::get_id();
+    box->reply = Json::parse(json);
+    box->replied = true;
+    box->changed.notify_all();
+  };
+  for (const std::string& host : {std::string(), localhost(closedPort())}) {
+    test::TempDir configDir;
+    Account(configDir.path()).write(host, std::nullopt);
+    Plugin plugin;
+    plugin.configure(configDir.path());
+    Box box;
+    ASSERT_EQ(plugin.performFn(searchFor({"ada@example.com"}).c_str(), receive, &box), 0);
+    std::unique_lock lock(box.mutex);
+    box.performReturned = true;
+    box.changed.notify_all();
+    ASSERT_TRUE(box.changed.wait_for(lock, 30s, [&] { return box.replied; })) << host;
+    EXPECT_TRUE(box.afterReturn) << host;
+    EXPECT_NE(box.thread, std::this_thread::get_id()) << host;
+    EXPECT_EQ(box.reply["errorCode"], 1005) << host;
+  }
+}
+
+}  // namespace
+}  // namespace kyn::itest
