@@ -245,7 +245,7 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
     Plugin plugin;
     plugin.configure(configDir.path());
     Box box;
-    ASSERT_EQ(plugin.performFn(searchFor({"ada@example.com"}).c_str(), receive, &box), 0);
+    ASSERT_EQ(plugin.library().perform(searchFor({"ada@example.com"}).c_str(), receive, &box), 0);
     std::unique_lock lock(box.mutex);
     box.performReturned = true;
     box.changed.notify_all();
