@@ -212,7 +212,7 @@ void printReply(const Plugin& plugin, const Json& reply, const std::optional<std
   const Json locations = reply.value("kynLocations", Json::array());
   if (locations.empty()) std::cout << "No location came back for the friends you asked about.\n";
   for (const auto& location : locations) {
-    const auto text = plugin.take(plugin.describeLocation(location.dump().c_str(), 1));
+    const auto text = plugin.take(plugin.describeLocation(location.dump().c_str(), 1, nullptr));
     const Json described = text.value_or(Json::object());
     std::string line = described.value("name", std::string("(unknown)"));
     line += " — " + described.value("place", std::string("?"));
