@@ -2,6 +2,7 @@
 // and every taken command is answered exactly once.
 #include "plugin/kyn_plugin.h"
 
+#include "account/Common.h"
 #include "contacts/ContactsUtilities.h"
 #include "datasource/KYNAXDataSource.h"
 #include "handlers/KYNAXSearch.h"
@@ -148,6 +149,14 @@ int kyn_plugin_configure(const char* config_dir, const char* language) {
   }
 }
 
+char* kyn_plugin_language(void) {
+  try {
+    return plugin::copyText(services().assistantPreferences.get()->languageCode().value_or(std::string()));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
 int kyn_plugin_set_log_level(const char* level) {
   if (level == nullptr) return -1;
   const auto parsed = platform::logLevelFromName(level);
@@ -235,6 +244,19 @@ char* kyn_plugin_find_people(const char* name) {
       if (contact) people.push_back(plugin::personForContact(*contact)->dictionary());
     }
     return plugin::copyText(platform::toJson(people));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+char* kyn_plugin_find_person(const char* handle) {
+  if (handle == nullptr) return nullptr;
+  try {
+    const std::string text(handle);
+    const auto contact = Common::sharedInstance().isHandleEmail(text) ? ContactsUtilities::contactForEmail(text)
+                                                                      : ContactsUtilities::contactForPhone(text);
+    if (!contact) return nullptr;
+    return plugin::copyText(platform::toJson(plugin::personForContact(*contact)->dictionary()));
   } catch (...) {
     return nullptr;
   }

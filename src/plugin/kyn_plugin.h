@@ -24,6 +24,11 @@ const char* kyn_plugin_version(void);
  * command, or while no command is in flight. Returns 0, or -1 for a directory that does not exist. */
 int kyn_plugin_configure(const char* config_dir, const char* language);
 
+/* The assistant's language in effect, as a BCP 47 tag ("de-CH"): the one given to
+ * kyn_plugin_configure, else config.json's, else the system's; "" when none is known. Free the text
+ * with kyn_plugin_free. */
+char* kyn_plugin_language(void);
+
 /* The minimum level of log lines: "debug", "info", "default", "error" or "off". Returns 0, or -1
  * for another word. */
 int kyn_plugin_set_log_level(const char* level);
@@ -58,6 +63,13 @@ unsigned char* kyn_plugin_friend_picture(const char* location_json, size_t* size
  * "AXPerson" objects with their e-mail addresses and phone numbers, for turning a spoken name into a
  * person. Free the text with kyn_plugin_free. NULL for a NULL name. */
 char* kyn_plugin_find_people(const char* name);
+
+/* The person of the user's address book who holds `handle`, an e-mail address (compared without
+ * regard to case) or a phone number (compared as the address book compares numbers): an "AXPerson"
+ * object as JSON with names, identifier, e-mail addresses and phone numbers, as an assistant hands a
+ * resolved person to a command. NULL when no contact holds the handle, or for a NULL handle. Free the
+ * text with kyn_plugin_free. */
+char* kyn_plugin_find_person(const char* handle);
 
 /* Frees a text or picture returned by the plug-in. */
 void kyn_plugin_free(void* memory);

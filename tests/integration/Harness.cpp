@@ -1,30 +1,11 @@
 #include "Harness.h"
 
-#include <dlfcn.h>
-#include <fcntl.h>
-#include <signal.h>
-#include <sys/prctl.h>
-#include <spawn.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
-#include <cerrno>
-#include <cstring>
 #include <fstream>
 #include <sstream>
 #include <stdexcept>
 
-extern char** environ;
-
 namespace kyn::itest {
 namespace {
-
-std::vector<char*> argvOf(std::vector<std::string>& args) {
-  std::vector<char*> argv;
-  for (auto& a : args) argv.push_back(a.data());
-  argv.push_back(nullptr);
-  return argv;
-}
 
 void writeFile(const std::filesystem::path& path, const std::string& text, unsigned mode) {
   std::filesystem::create_directories(path.parent_path());
@@ -33,6 +14,11 @@ void writeFile(const std::filesystem::path& path, const std::string& text, unsig
     out << text;
   }
   std::filesystem::permissions(path, static_cast<std::filesystem::perms>(mode));
+}
+
+std::optional<Json> parse(const std::optional<std::string>& text) {
+  if (!text) return std::nullopt;
+  return Json::parse(*text, nullptr, false);
 }
 
 }  // namespace
@@ -46,35 +32,14 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
                                    "--ca-out",            (dir_ / "ca.pem"), "--log-file",
                                    (dir_ / "requests.jsonl")};
   args.insert(args.end(), extraArgs.begin(), extraArgs.end());
-
-  int out[2];
-  if (pipe2(out, O_CLOEXEC) != 0) throw std::runtime_error("pipe failed");
-  const int errors = open((dir_ / "sim.err").c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0600);
-  auto argv = argvOf(args);
-  const pid_t parent = getpid();
-  pid_ = fork();
-  if (pid_ == 0) {
-    // The server must not outlive the test, even one that crashes; and it must not hold the test's
-    // own output open, or the test runner would wait for it.
-    prctl(PR_SET_PDEATHSIG, SIGTERM);
-    if (getppid() != parent) _exit(1);
-    dup2(out[1], STDOUT_FILENO);
-    if (errors >= 0) dup2(errors, STDERR_FILENO);
-    execv(argv[0], argv.data());
-    _exit(127);
-  }
-  close(out[1]);
-  if (errors >= 0) close(errors);
-  if (pid_ < 0) {
-    close(out[0]);
-    throw std::runtime_error("cannot start kyn-sim");
-  }
-  // The one line "kyn-sim listening on https://ADDRESS:PORT" says it is ready; reading blocks until
-  // it comes (or the process ends).
-  std::string line;
-  char c;
-  while (read(out[0], &c, 1) == 1 && c != '\n') line.push_back(c);
-  close(out[0]);
+  // The server must not outlive the test, even one that crashes.
+  host::SpawnOptions options;
+  options.captureOutput = true;
+  options.errorFile = dir_ / "sim.err";
+  options.endWithParent = true;
+  process_ = std::make_unique<host::Process>(args, options);
+  // The one line "kyn-sim listening on https://ADDRESS:PORT" says it is ready.
+  const std::string line = process_->readLine().value_or("");
   const auto colon = line.rfind(':');
   if (line.find("listening on https://") == std::string::npos || colon == std::string::npos) {
     stop();
@@ -88,14 +53,7 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
 
 Sim::~Sim() { stop(); }
 
-void Sim::stop() {
-  if (pid_ <= 0) return;
-  kill(pid_, SIGTERM);
-  int status = 0;
-  while (waitpid(pid_, &status, 0) < 0 && errno == EINTR) {
-  }
-  pid_ = -1;
-}
+void Sim::stop() { process_.reset(); }
 
 std::vector<Json> Sim::requests() const {
   std::vector<Json> out;
@@ -123,32 +81,16 @@ void Account::addCard(const std::string& fileName, const std::string& card) cons
   writeFile(dir / "contacts" / fileName, card, 0644);
 }
 
-Plugin::Plugin(bool captureLog) {
-  handle_ = dlopen(KYN_PLUGIN_PATH, RTLD_NOW | RTLD_LOCAL);
-  if (handle_ == nullptr) throw std::runtime_error(std::string("cannot load the plug-in: ") + dlerror());
-  performFn = reinterpret_cast<decltype(performFn)>(dlsym(handle_, "kyn_plugin_perform"));
-  configure_ = reinterpret_cast<decltype(configure_)>(dlsym(handle_, "kyn_plugin_configure"));
-  shutdown_ = reinterpret_cast<decltype(shutdown_)>(dlsym(handle_, "kyn_plugin_shutdown"));
-  auto setLevel = reinterpret_cast<decltype(&kyn_plugin_set_log_level)>(dlsym(handle_, "kyn_plugin_set_log_level"));
-  auto setCallback =
-      reinterpret_cast<decltype(&kyn_plugin_set_log_callback)>(dlsym(handle_, "kyn_plugin_set_log_callback"));
-  if (!performFn || !configure_ || !shutdown_ || !setLevel || !setCallback) throw std::runtime_error("entry point missing");
+Plugin::Plugin(bool captureLog) : library_(KYN_PLUGIN_PATH) {
   if (captureLog) {
-    setLevel("debug");
-    setCallback(&Plugin::onLog, this);
+    library_.setLogLevel("debug");
+    library_.setLogCallback(&Plugin::onLog, this);
   } else {
-    setLevel("off");
+    library_.setLogLevel("off");
   }
 }
 
-Plugin::~Plugin() {
-  if (handle_ == nullptr) return;
-  shutdown_();
-  auto setCallback =
-      reinterpret_cast<decltype(&kyn_plugin_set_log_callback)>(dlsym(handle_, "kyn_plugin_set_log_callback"));
-  setCallback(nullptr, nullptr);
-  dlclose(handle_);
-}
+Plugin::~Plugin() = default;
 
 void Plugin::onLog(int /*level*/, const char* message, void* context) {
   auto* self = static_cast<Plugin*>(context);
@@ -156,56 +98,38 @@ void Plugin::onLog(int /*level*/, const char* message, void* context) {
   self->log_.emplace_back(message);
 }
 
-void* Plugin::symbol(const char* name) const { return dlsym(handle_, name); }
-
 std::vector<std::string> Plugin::logLines() const {
   std::lock_guard lock(logMutex_);
   return log_;
 }
 
 void Plugin::configure(const std::filesystem::path& configDir, const char* language) {
-  if (configure_(configDir.c_str(), language) != 0) throw std::runtime_error("configure failed");
+  if (library_.configure(configDir.c_str(), language) != 0) throw std::runtime_error("configure failed");
 }
 
-void Plugin::shutdown() { shutdown_(); }
+void Plugin::shutdown() { library_.shutdown(); }
 
 std::vector<int> Plugin::replyCounts() {
   std::vector<int> counts;
-  for (const auto& box : boxes_) {
-    std::lock_guard lock(box->mutex);
-    counts.push_back(box->count);
-  }
+  for (const auto& box : boxes_) counts.push_back(box->count());
   return counts;
 }
 
-void Plugin::ReplyBox::receive(const char* json, void* context) {
-  auto* box = static_cast<ReplyBox*>(context);
-  std::lock_guard lock(box->mutex);
-  if (++box->count == 1) box->first = Json::parse(json, nullptr, false);
-  box->arrived.notify_all();
-}
-
 Plugin::Outcome Plugin::perform(const std::string& commandJson, std::chrono::seconds timeout) {
-  ReplyBox box;
-  if (performFn(commandJson.c_str(), &ReplyBox::receive, &box) != 0) throw std::runtime_error("command refused");
-  {
-    std::unique_lock lock(box.mutex);
-    box.arrived.wait_for(lock, timeout, [&] { return box.count > 0; });
-  }
-  shutdown_();  // joins the network thread: every reply there will be has come
-  std::lock_guard lock(box.mutex);
-  return {box.first, box.count};
+  host::Reply box;
+  if (library_.perform(commandJson.c_str(), &host::Reply::receive, &box) != 0) throw std::runtime_error("command refused");
+  (void)box.wait(timeout);
+  library_.shutdown();  // joins the network thread: every reply there will be has come
+  return {parse(box.wait(std::chrono::seconds(0))), box.count()};
 }
 
 std::optional<Json> Plugin::performAndWait(const std::string& commandJson, std::chrono::seconds timeout) {
   // The box lives as long as this object, which shuts the plug-in down before letting it go, so a
   // reply that comes after the wait gave up still has somewhere to land.
-  boxes_.push_back(std::make_unique<ReplyBox>());
-  ReplyBox& box = *boxes_.back();
-  if (performFn(commandJson.c_str(), &ReplyBox::receive, &box) != 0) throw std::runtime_error("command refused");
-  std::unique_lock lock(box.mutex);
-  if (!box.arrived.wait_for(lock, timeout, [&] { return box.count > 0; })) return std::nullopt;
-  return box.first;
+  boxes_.push_back(std::make_unique<host::Reply>());
+  host::Reply& box = *boxes_.back();
+  if (library_.perform(commandJson.c_str(), &host::Reply::receive, &box) != 0) throw std::runtime_error("command refused");
+  return parse(box.wait(timeout));
 }
 
 std::string searchFor(const std::vector<std::string>& handles, bool withMyLocation) {
@@ -218,34 +142,6 @@ std::string searchFor(const std::vector<std::string>& handles, bool withMyLocati
   }
   if (withMyLocation) command["currentLocation"] = {{"latitude", 45.5231}, {"longitude", -122.6765}, {"accuracy", 30}};
   return command.dump();
-}
-
-ProgramResult runProgram(const std::vector<std::string>& args) {
-  std::vector<std::string> copy = args;
-  auto argv = argvOf(copy);
-  int out[2];
-  if (pipe2(out, O_CLOEXEC) != 0) return {};
-  posix_spawn_file_actions_t actions;
-  posix_spawn_file_actions_init(&actions);
-  posix_spawn_file_actions_adddup2(&actions, out[1], STDOUT_FILENO);
-  pid_t pid = -1;
-  const int spawned = posix_spawn(&pid, argv[0], &actions, nullptr, argv.data(), environ);
-  posix_spawn_file_actions_destroy(&actions);
-  close(out[1]);
-  ProgramResult result;
-  if (spawned != 0) {
-    close(out[0]);
-    return result;
-  }
-  char buffer[4096];
-  ssize_t n;
-  while ((n = read(out[0], buffer, sizeof buffer)) > 0) result.output.append(buffer, static_cast<std::size_t>(n));
-  close(out[0]);
-  int status = 0;
-  while (waitpid(pid, &status, 0) < 0 && errno == EINTR) {
-  }
-  result.status = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-  return result;
 }
 
 }  // namespace kyn::itest

@@ -3,15 +3,14 @@
 // The pieces of an end-to-end test: a kyn-sim process on loopback, a configuration directory for
 // the plug-in, and the plug-in itself loaded with dlopen as an assistant loads it.
 
-#include "plugin/kyn_plugin.h"
+#include "host/PluginLibrary.h"
+#include "host/Process.h"
+#include "host/Reply.h"
 #include "support/Fakes.h"
 
 #include <nlohmann/json.hpp>
 
-#include <sys/types.h>
-
 #include <chrono>
-#include <condition_variable>
 #include <filesystem>
 #include <memory>
 #include <mutex>
@@ -22,6 +21,8 @@
 namespace kyn::itest {
 
 using Json = nlohmann::ordered_json;
+using host::ProgramResult;
+using host::runProgram;
 
 inline constexpr const char* kPersonId = "P-1000001";
 inline constexpr const char* kToken = "tok-5f1c2e9a-integration";
@@ -44,7 +45,7 @@ class Sim {
 
  private:
   std::filesystem::path dir_;
-  pid_t pid_ = -1;
+  std::unique_ptr<host::Process> process_;
   int port_ = 0;
 };
 
@@ -85,37 +86,21 @@ class Plugin {
   [[nodiscard]] std::vector<int> replyCounts();
 
   [[nodiscard]] std::vector<std::string> logLines() const;
-  /// Another entry point of the plug-in.
-  [[nodiscard]] void* symbol(const char* name) const;
-
-  decltype(&kyn_plugin_perform) performFn = nullptr;
+  /// Every entry point of the plug-in.
+  [[nodiscard]] host::PluginLibrary& library() noexcept { return library_; }
+  [[nodiscard]] void* symbol(const char* name) const { return library_.symbol(name); }
 
  private:
-  struct ReplyBox {
-    std::mutex mutex;
-    std::condition_variable arrived;
-    std::optional<Json> first;
-    int count = 0;
-    static void receive(const char* json, void* context);
-  };
   static void onLog(int level, const char* message, void* context);
 
-  void* handle_ = nullptr;
-  decltype(&kyn_plugin_configure) configure_ = nullptr;
-  decltype(&kyn_plugin_shutdown) shutdown_ = nullptr;
   mutable std::mutex logMutex_;
   std::vector<std::string> log_;
-  std::vector<std::unique_ptr<ReplyBox>> boxes_;
+  std::vector<std::unique_ptr<host::Reply>> boxes_;
+  // Last, so that it is unloaded first: shutting down may still deliver replies and log lines.
+  host::PluginLibrary library_;
 };
 
 /// A search command for friends given by e-mail address or phone number.
 [[nodiscard]] std::string searchFor(const std::vector<std::string>& handles, bool withMyLocation = true);
-
-/// Runs a program to its end; returns its exit status and what it printed on stdout.
-struct ProgramResult {
-  int status = -1;
-  std::string output;
-};
-[[nodiscard]] ProgramResult runProgram(const std::vector<std::string>& argv);
 
 }  // namespace kyn::itest

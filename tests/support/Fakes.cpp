@@ -9,28 +9,6 @@
 
 namespace kyn::test {
 
-TempDir::TempDir() {
-  std::string templ = (std::filesystem::temp_directory_path() / "kyn-test-XXXXXX").string();
-  if (::mkdtemp(templ.data()) == nullptr) throw std::runtime_error("mkdtemp failed");
-  path_ = templ;
-}
-
-TempDir::~TempDir() {
-  std::error_code ec;
-  std::filesystem::remove_all(path_, ec);
-}
-
-std::filesystem::path TempDir::write(const std::string& name, std::string_view text, unsigned mode) const {
-  const auto file = path_ / name;
-  std::filesystem::create_directories(file.parent_path());
-  {
-    std::ofstream out(file, std::ios::binary | std::ios::trunc);
-    out.write(text.data(), static_cast<std::streamsize>(text.size()));
-  }
-  ::chmod(file.c_str(), mode);
-  return file;
-}
-
 std::shared_ptr<AXPerson> makePerson(std::vector<std::optional<std::string>> emails,
                                      std::vector<std::optional<std::string>> phones, std::optional<std::string> fullName) {
   auto person = std::make_shared<AXPerson>();

@@ -2,6 +2,7 @@
 
 // Fakes of the platform services, installed through the services registry.
 
+#include "host/Process.h"
 #include "platform/Services.h"
 #include "platform/assistant/Model.h"
 
@@ -70,20 +71,7 @@ class FixedClock final : public platform::Clock {
   std::atomic<platform::Date> now_;
 };
 
-/// A temporary directory, removed with everything in it at the end of the scope.
-class TempDir {
- public:
-  TempDir();
-  ~TempDir();
-  TempDir(const TempDir&) = delete;
-  TempDir& operator=(const TempDir&) = delete;
-  [[nodiscard]] const std::filesystem::path& path() const noexcept { return path_; }
-  /// Writes `text` to `name` inside the directory (with the given mode) and returns its path.
-  std::filesystem::path write(const std::string& name, std::string_view text, unsigned mode = 0600) const;
-
- private:
-  std::filesystem::path path_;
-};
+using host::TempDir;
 
 /// An assistant person with these e-mail addresses and phone numbers (an absent text makes an entry
 /// without one); a list is present only when it has entries.

@@ -1,0 +1,62 @@
+#include "host/PluginLibrary.h"
+
+#include <dlfcn.h>
+
+#include <cstdlib>
+
+namespace kyn::host {
+
+PluginLibrary::PluginLibrary(const std::filesystem::path& path) {
+  handle_ = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+  if (handle_ == nullptr) {
+    const char* why = dlerror();
+    throw LoadError(why != nullptr ? why : "cannot load " + path.string());
+  }
+  auto resolve = [this](auto& entry, const char* name) {
+    entry = reinterpret_cast<std::remove_reference_t<decltype(entry)>>(dlsym(handle_, name));
+    if (entry == nullptr) {
+      dlclose(handle_);
+      handle_ = nullptr;
+      throw LoadError(std::string("the plug-in lacks ") + name);
+    }
+  };
+  resolve(version, "kyn_plugin_version");
+  resolve(configure, "kyn_plugin_configure");
+  resolve(language, "kyn_plugin_language");
+  resolve(setLogLevel, "kyn_plugin_set_log_level");
+  resolve(setLogCallback, "kyn_plugin_set_log_callback");
+  resolve(perform, "kyn_plugin_perform");
+  resolve(describeLocation, "kyn_plugin_describe_location");
+  resolve(findPeople, "kyn_plugin_find_people");
+  resolve(findPerson, "kyn_plugin_find_person");
+  resolve(free, "kyn_plugin_free");
+  resolve(shutdown, "kyn_plugin_shutdown");
+}
+
+PluginLibrary::~PluginLibrary() {
+  if (handle_ == nullptr) return;
+  shutdown();
+  setLogCallback(nullptr, nullptr);
+  dlclose(handle_);
+}
+
+void* PluginLibrary::symbol(const char* name) const { return dlsym(handle_, name); }
+
+std::optional<std::string> PluginLibrary::take(char* text) const {
+  if (text == nullptr) return std::nullopt;
+  std::string copy(text);
+  free(text);
+  return copy;
+}
+
+std::filesystem::path defaultPluginPath() {
+  std::error_code ec;
+  const auto self = std::filesystem::read_symlink("/proc/self/exe", ec);
+  if (!ec) {
+    auto candidate = self.parent_path().parent_path() / "lib" / "libkyn-assistant.so";
+    if (std::filesystem::exists(candidate, ec)) return candidate;
+  }
+  return "libkyn-assistant.so";
+}
+
+}  // namespace kyn::host

@@ -1,0 +1,57 @@
+#pragma once
+
+// The pieces of kyn-assistant: a command of the command line turns its options into an assistant
+// command; the plug-in performs it; the reply is printed for a person (or as JSON).
+
+#include "Texts.h"
+#include "host/PluginLibrary.h"
+
+#include <CLI/CLI.hpp>
+#include <nlohmann/json.hpp>
+
+#include <optional>
+#include <ostream>
+#include <stdexcept>
+#include <string>
+
+namespace kyn::cli {
+
+using Json = nlohmann::ordered_json;
+
+enum ExitCode { kSuccess = 0, kCommandFailed = 1, kUsage = 2, kNoAnswer = 3 };
+
+/// Options that do not fit, found after parsing; the message is for the user (exit status 2).
+class UsageError : public std::runtime_error {
+ public:
+  using std::runtime_error::runtime_error;
+};
+
+/// What a command needs while it builds the assistant command and prints the reply.
+struct Session {
+  host::PluginLibrary& plugin;
+  const Texts& texts;
+};
+
+/// One command of the command line (search, command, ...).
+class HostCommand {
+ public:
+  virtual ~HostCommand() = default;
+  /// Whether the user chose this command.
+  [[nodiscard]] virtual bool chosen() const = 0;
+  /// The assistant command to perform; throws UsageError for options that do not fit.
+  [[nodiscard]] virtual Json build(Session& session) = 0;
+};
+
+/// A friend as an assistant hands it over: the person of the address book who holds the e-mail
+/// address or phone number (or the handle alone when no contact holds it), or the one person whose
+/// name holds `who`. Throws UsageError when no one or several people match a name.
+[[nodiscard]] Json resolveFriend(Session& session, const std::string& who);
+
+/// "LAT,LON" (or "LAT,LON,ACCURACY" when `allowAccuracy`) as an assistant location; nothing for a
+/// text that is no coordinate.
+[[nodiscard]] std::optional<Json> parseCoordinate(const std::string& text, bool allowAccuracy);
+
+/// Prints the reply to `command` for a person, in the assistant's language.
+void printReply(Session& session, const Json& command, const Json& reply, std::ostream& out);
+
+}  // namespace kyn::cli

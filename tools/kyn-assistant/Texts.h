@@ -1,0 +1,60 @@
+#pragma once
+
+// The host's own texts, in the assistant's language (English, German, French).
+
+#include <string>
+#include <string_view>
+
+namespace kyn::cli {
+
+enum class Text {
+  NotLoggedIn,
+  RestrictedInRegion,
+  RestrictedInAccount,
+  Locked,
+  NotAvailable,
+  NotAFriend,
+  NoFriends,
+  GeoFenceNotCreated,
+  LabelNotFound,
+  AddressNotFound,
+  FailedWithCode,  // %s: the code
+  NeedTarget,      // the plug-in's reason when a command names no one and nowhere
+  NoLocations,
+  AtPlaceYes,  // %s: the place
+  AtPlaceNo,   // %s: the place
+  Unknown,
+  NoName,
+  NoOneNamed,        // %s: the name
+  SeveralPeople,     // %s: the name
+  SayWhichOne,
+  SeeVerbose,
+  CannotLoad,        // %s: the path, %s: why
+  NoAnswer,          // %s: seconds
+  NoConfigDirectory, // %s: the directory
+  BadHere,           // %s: the text given
+  BadPlaceAt,        // %s: the text given
+  CannotRead,        // %s: the file
+  Count
+};
+
+/// The host's string tables for one language: German for "de…", French for "fr…", else English.
+class Texts {
+ public:
+  explicit Texts(std::string_view languageTag);
+
+  [[nodiscard]] std::string_view operator[](Text text) const;
+  /// The text with each "%s" replaced by the next argument, in order.
+  template <class... Args>
+  [[nodiscard]] std::string format(Text text, const Args&... args) const {
+    return fill((*this)[text], {std::string_view(args)...});
+  }
+  [[nodiscard]] std::string_view language() const noexcept { return language_; }
+
+ private:
+  static std::string fill(std::string_view pattern, std::initializer_list<std::string_view> args);
+  std::string_view language_;
+  int column_ = 0;
+};
+
+}  // namespace kyn::cli
