@@ -26,9 +26,11 @@ const Json kFriends = Json::parse(R"({
   "serverContext": {"minCallbackIntervalInMS": 5000}
 })");
 
+// Ada's card carries a 2x1 grey picture.
+const char* kAdaPicture = "P5\n2 1\n255\n\x10\xF0";
 const char* kAdaCard =
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
-    "EMAIL;TYPE=HOME:ada@example.com\r\nEND:VCARD\r\n";
+    "EMAIL;TYPE=HOME:ada@example.com\r\nPHOTO;ENCODING=b;TYPE=PGM:UDUKMiAxCjI1NQoQ8A==\r\nEND:VCARD\r\n";
 const char* kBramCard =
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:bram-1\r\nFN:Bram Tolliver\r\nN:Tolliver;Bram;;;\r\n"
     "TEL;TYPE=CELL:(503) 555-0102\r\nEND:VCARD\r\n";
@@ -295,6 +297,7 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
                                  "45.5231,-122.6765,30"});
   EXPECT_EQ(found.status, 0) << found.output;
   EXPECT_NE(found.output.find("Ada Marlowe — Work · 45.51520, -122.67840 · "), std::string::npos) << found.output;
+  EXPECT_NE(found.output.find(" away\n"), std::string::npos) << found.output;  // the plug-in's distance text
   EXPECT_EQ(sim->requests().back()["handles"], Json::parse(R"(["ada@example.com"])"));
 
   // A handle the address book holds is completed into the contact's person, as an assistant does;
@@ -307,6 +310,16 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "Nobody Known"}).status, 2);
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--here", "95,1"}).status, 2);
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", (configDir.path() / "missing").string(), "search"}).status, 2);
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
+
+  // Pictures are written as the address book holds them, named after the handle.
+  const test::TempDir pictures;
+  const auto withPictures = runProgram({KYN_CLI_PATH, "--config", config, "--pictures", pictures.path().string(),
+                                        "search", "--friend", "ada@example.com", "--friend", "+15035550102"});
+  EXPECT_EQ(withPictures.status, 0) << withPictures.output;
+  std::ifstream picture(pictures.path() / "ada@example.com.pnm", std::ios::binary);
+  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(picture), {}), kAdaPicture);
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(pictures.path()), {}), 1);  // Bram has none
 
   std::filesystem::remove(configDir.path() / "account.json");
   const auto signedOut = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"});
@@ -328,8 +341,7 @@ TEST(PluginPresentation, DistanceTimeAndPictureOfAFriend) {
   test::TempDir configDir;
   Account account(configDir.path());
   account.write("localhost:1", std::nullopt);
-  account.addCard("ada.vcf", "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\n"
-                             "EMAIL:ada@example.com\r\nPHOTO;ENCODING=b;TYPE=PGM:UDUKMiAxCjI1NQoQ8A==\r\nEND:VCARD\r\n");
+  account.addCard("ada.vcf", kAdaCard);
   Plugin plugin;
   plugin.configure(configDir.path(), "de");
   auto describe = reinterpret_cast<decltype(&kyn_plugin_describe_location)>(plugin.symbol("kyn_plugin_describe_location"));
@@ -362,7 +374,7 @@ TEST(PluginPresentation, DistanceTimeAndPictureOfAFriend) {
   int width = 0, height = 0;
   unsigned char* bytes = picture(location.dump().c_str(), &size, &width, &height);
   ASSERT_NE(bytes, nullptr);
-  EXPECT_EQ(std::string(reinterpret_cast<const char*>(bytes), size), std::string("P5\n2 1\n255\n\x10\xF0"));
+  EXPECT_EQ(std::string(reinterpret_cast<const char*>(bytes), size), kAdaPicture);
   EXPECT_EQ(width, 2);
   EXPECT_EQ(height, 1);
   release(bytes);

@@ -9,6 +9,7 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+#include <filesystem>
 #include <optional>
 #include <ostream>
 #include <stdexcept>
@@ -53,5 +54,11 @@ class HostCommand {
 
 /// Prints the reply to `command` for a person, in the assistant's language.
 void printReply(Session& session, const Json& command, const Json& reply, std::ostream& out);
+
+/// Writes the contact picture of every friend of a search reply that has one into `directory`, as
+/// the address book stores it, named after the friend's handle ("ada@example.com.jpg"). Says where
+/// each went on `report` (when given) and what could not be written on `errors`.
+void savePictures(Session& session, const Json& reply, const std::filesystem::path& directory, std::ostream* report,
+                  std::ostream& errors);
 
 }  // namespace kyn::cli

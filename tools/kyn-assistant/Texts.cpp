@@ -84,6 +84,8 @@ constexpr Row kTable[] = {
                       "--place-at erwartet BREITE,LÄNGE, nicht „%s“",
                       "--place-at attend LAT,LON, et non « %s »"}},
   {Text::CannotRead, {"cannot read %s", "%s lässt sich nicht lesen", "impossible de lire %s"}},
+  {Text::CannotWrite, {"cannot write %s", "%s lässt sich nicht schreiben", "impossible d’écrire %s"}},
+  {Text::PictureSaved, {"Picture of %s: %s", "Bild von %s: %s", "Photo de %s : %s"}},
 };
 // clang-format on
 

@@ -23,6 +23,7 @@ struct Options {
   std::string language;
   bool json = false;
   bool verbose = false;
+  std::string picturesDir;
   double timeout = 60.0;
 };
 
@@ -37,6 +38,9 @@ void defineOptions(CLI::App& app, Options& options) {
   app.add_option("--language", options.language, "The assistant's language, a BCP 47 tag such as en-US, de or fr");
   app.add_flag("--json", options.json, "Print the reply dictionary as JSON instead of text");
   app.add_flag("-v,--verbose", options.verbose, "Show the plug-in's log on standard error");
+  app.add_option("--pictures", options.picturesDir,
+                 "A directory to write each found friend's contact picture into, named after the friend's handle")
+      ->check(CLI::ExistingDirectory);
   app.add_option("--timeout", options.timeout, "Seconds to wait for the reply")
       ->default_val(60.0)
       ->check(CLI::PositiveNumber);
@@ -90,6 +94,9 @@ int run(const Options& options, HostCommand& chosen) {
   const Json parsed = Json::parse(*reply, nullptr, false);
   if (options.json) std::cout << parsed.dump(2) << "\n";
   else printReply(session, command, parsed, std::cout);
+  if (!options.picturesDir.empty()) {
+    savePictures(session, parsed, options.picturesDir, options.json ? nullptr : &std::cout, std::cerr);
+  }
   if (parsed.value("class", "") != "AXCommandFailed") return kSuccess;
   if (!options.json && !options.verbose) std::cerr << texts[Text::SeeVerbose] << "\n";
   return kCommandFailed;
