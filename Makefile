@@ -3,7 +3,7 @@
 PRESET ?= release
 BUILD  := build/$(PRESET)
 
-.PHONY: all deps configure build test demo asan tsan fuzz bench clean
+.PHONY: all deps configure build test demo asan tsan fuzz bench package clean
 
 all: build
 
@@ -35,6 +35,12 @@ tsan:
 fuzz: deps
 	@test -f build/fuzz/build.ninja || cmake --preset fuzz
 	@cmake --build --preset fuzz
+
+# Debian packages in build/package/: kyn-assistant and kyn-assistant-dev.
+package: deps
+	@test -f build/package/build.ninja || cmake --preset package
+	@cmake --build --preset package
+	@cd build/package && cpack
 
 clean:
 	rm -rf build

@@ -1,5 +1,7 @@
 #include "platform/Services.h"
 
+#include "platform/sysinfo/LinuxSystemInfo.h"
+
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>
@@ -48,6 +50,12 @@ Services::Services()
       locale([] { return std::make_shared<IcuLocaleInfo>(); }),
       contactStore([this]() -> std::shared_ptr<ContactStore> {
         return std::make_shared<VCardContactStore>(configuration()->contactsPath(), phoneRegionOfLocale(*locale.get()));
+      }),
+      postalAddressFormatter([this] {
+        // Region and language are read on every call: either service may be replaced meanwhile.
+        return std::make_shared<TablePostalAddressFormatter>(
+            [this] { return locale.get()->countryCode(); },
+            [this] { return assistantPreferences.get()->languageCode(); });
       }) {}
 
 std::shared_ptr<const Configuration> Services::configuration() {
@@ -79,6 +87,7 @@ void Services::resetSlots() {
   assistantPreferences.set(nullptr);
   locale.set(nullptr);
   contactStore.set(nullptr);
+  postalAddressFormatter.set(nullptr);
 }
 
 std::string avixUILocalizedStringForKey(std::string_view key) {

@@ -3,6 +3,7 @@
 // The platform services that the plug-in reaches, in one registry. Each service is built on first use
 // from the configuration (the Linux implementation); a host or a test may install its own.
 
+#include "platform/address/PostalAddress.h"
 #include "platform/assistant/AssistantPreferences.h"
 #include "platform/config/Configuration.h"
 #include "platform/contacts/ContactStore.h"
@@ -71,6 +72,7 @@ class Services {
   ServiceSlot<AssistantPreferences> assistantPreferences;
   ServiceSlot<LocaleInfo> locale;
   ServiceSlot<ContactStore> contactStore;
+  ServiceSlot<PostalAddressFormatter> postalAddressFormatter;
 
   [[nodiscard]] Log& log() { return Log::shared(); }
   [[nodiscard]] NotificationCenter& notificationCenter() { return NotificationCenter::defaultCenter(); }

@@ -8,6 +8,7 @@
 #include "handlers/KYNAXSearch.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
+#include "platform/sysinfo/LinuxSystemInfo.h"
 #include "platform/value/Json.h"
 #include "utils/KYNAXUtils.h"
 
@@ -259,6 +260,53 @@ char* kyn_plugin_find_person(const char* handle) {
     return plugin::copyText(platform::toJson(plugin::personForContact(*contact)->dictionary()));
   } catch (...) {
     return nullptr;
+  }
+}
+
+int kyn_plugin_sign_in(const char* person_id, const char* username, const char* host, const char* token) {
+  if (person_id == nullptr) return KYN_SIGN_IN_BAD_PERSON_ID;
+  if (username == nullptr) return KYN_SIGN_IN_BAD_USERNAME;
+  if (host == nullptr) return KYN_SIGN_IN_BAD_HOST;
+  if (token == nullptr) return KYN_SIGN_IN_BAD_TOKEN;
+  try {
+    const platform::SignIn signIn{person_id, username, host, token};
+    switch (platform::checkSignIn(signIn)) {
+      case platform::SignInProblem::PersonId: return KYN_SIGN_IN_BAD_PERSON_ID;
+      case platform::SignInProblem::Username: return KYN_SIGN_IN_BAD_USERNAME;
+      case platform::SignInProblem::ServiceHost: return KYN_SIGN_IN_BAD_HOST;
+      case platform::SignInProblem::Token: return KYN_SIGN_IN_BAD_TOKEN;
+      case platform::SignInProblem::None: break;
+    }
+    return platform::writeSignIn(services().configuration()->directory(), signIn) ? KYN_SIGN_IN_OK
+                                                                                    : KYN_SIGN_IN_NOT_WRITTEN;
+  } catch (...) {
+    return KYN_SIGN_IN_NOT_WRITTEN;
+  }
+}
+
+char* kyn_plugin_account(void) {
+  try {
+    const auto configuration = services().configuration();
+    const auto file = platform::readAccountFile(configuration->accountFile());
+    if (!file) return nullptr;
+    Value out = Value::object();
+    if (file->personId) out["personId"] = *file->personId;
+    if (file->username) out["username"] = *file->username;
+    if (file->serviceHost) out["serviceHost"] = *file->serviceHost;
+    out["provisioned"] = file->provisioned.value_or(true);
+    out["restricted"] = file->restricted.value_or(false);
+    out["token"] = platform::readApplicationToken(configuration->tokenFile()) ? "readable" : "unreadable";
+    return plugin::copyText(platform::toJson(out));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+int kyn_plugin_sign_out(void) {
+  try {
+    return platform::removeSignIn(services().configuration()->directory()) ? 0 : 1;
+  } catch (...) {
+    return 1;
   }
 }
 

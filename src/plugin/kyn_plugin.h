@@ -71,6 +71,30 @@ char* kyn_plugin_find_people(const char* name);
  * text with kyn_plugin_free. */
 char* kyn_plugin_find_person(const char* handle);
 
+/* What kyn_plugin_sign_in returns. */
+enum {
+  KYN_SIGN_IN_OK = 0,
+  KYN_SIGN_IN_BAD_PERSON_ID = 1, /* empty, too long, or holds control characters */
+  KYN_SIGN_IN_BAD_USERNAME = 2,
+  KYN_SIGN_IN_BAD_HOST = 3,      /* not host or host:port (a DNS name, an IPv4 or [IPv6] address) */
+  KYN_SIGN_IN_BAD_TOKEN = 4,     /* empty, too long, or holds blanks or control characters */
+  KYN_SIGN_IN_NOT_WRITTEN = 5    /* the files could not be written (the log says why) */
+};
+
+/* Signs an account in: writes account.json and the owner-only token file of the configuration
+ * directory (made when missing). Both files are written completely before either replaces the old
+ * one, so wrong input or a failed write leaves the previous account as it was. The token is never
+ * logged. */
+int kyn_plugin_sign_in(const char* person_id, const char* username, const char* host, const char* token);
+
+/* The signed-in account as JSON, without the token: {"personId", "username", "serviceHost",
+ * "provisioned", "restricted", "token": "readable" or "unreadable"} (absent members left out). NULL
+ * when no account file is there. Free the text with kyn_plugin_free. */
+char* kyn_plugin_account(void);
+
+/* Signs out: removes account.json and the token file. Returns 0, or 1 when no one was signed in. */
+int kyn_plugin_sign_out(void);
+
 /* Frees a text or picture returned by the plug-in. */
 void kyn_plugin_free(void* memory);
 

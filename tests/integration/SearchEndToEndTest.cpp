@@ -386,3 +386,40 @@ TEST(PluginPresentation, DistanceTimeAndPictureOfAFriend) {
 
 }  // namespace
 }  // namespace kyn::itest
+
+namespace kyn::itest {
+namespace {
+
+// Signing in through the host: wrong input leaves the old account whole; the token is stored
+// owner-only and never shown; signing out ends the service.
+TEST_F(SearchEndToEnd, TheHostSignsInAndOut) {
+  start();
+  const std::string config = configDir.path().string();
+  const auto host = "localhost:" + std::to_string(sim->port());
+  auto login = [&](const std::string& hostName, const std::string& token) {
+    host::SpawnOptions input;
+    input.input = token + "\n";
+    return runProgram({KYN_CLI_PATH, "--config", config, "account", "login", "--person-id", kPersonId, "--username",
+                       "sam@example.com", "--host", hostName}, input);
+  };
+  std::filesystem::remove(configDir.path() / "token");
+  EXPECT_EQ(login("https://" + host, kToken).status, 2);
+  EXPECT_EQ(login(host, "two words").status, 2);
+  EXPECT_FALSE(std::filesystem::exists(configDir.path() / "token"));  // nothing written
+
+  ASSERT_EQ(login(host, kToken).status, 0);
+  EXPECT_EQ(std::filesystem::status(configDir.path() / "token").permissions() & std::filesystem::perms::all,
+            std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);
+  const auto shown = runProgram({KYN_CLI_PATH, "--config", config, "account", "show"});
+  EXPECT_EQ(shown.status, 0);
+  EXPECT_NE(shown.output.find(host), std::string::npos) << shown.output;
+  EXPECT_EQ(shown.output.find(kToken), std::string::npos);
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 0);
+
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "account", "logout"}).status, 0);
+  EXPECT_FALSE(std::filesystem::exists(configDir.path() / "account.json"));
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 1);
+}
+
+}  // namespace
+}  // namespace kyn::itest

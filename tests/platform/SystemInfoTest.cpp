@@ -1,4 +1,4 @@
-#include "platform/sysinfo/SystemInfo.h"
+#include "platform/sysinfo/LinuxSystemInfo.h"
 #include "support/PlatformTest.h"
 
 #include <unistd.h>

@@ -25,7 +25,7 @@ const char* const kData = R"({
 
 class GetLocationsTest : public ::testing::Test {
  protected:
-  DataSet data = parseDataSet(kData);
+  AccountView data = parseDataSet(kData).view(0);
 
   Json ask(Json request) const {
     request["clientContext"] = Json{{"locale", "en-US"}};
@@ -127,7 +127,7 @@ TEST_F(GetLocationsTest, TheLocationCarriesTheTimeOfTheFix) {
             R"("streetAddress":"1 Example Way","labels":[{"label":"Work"}],)"
             R"("address":{"locality":"Portland","stateCode":"OR"}})");
   EXPECT_EQ(answer["locations"]["cleo@example.org"]["location"]["timestamp"], 1'700'000'000'000);
-  data.friends[2].timestampMs.reset();
+  data.friends[2].whereabouts.timestampMs.reset();
   EXPECT_FALSE(ask(Json{{"handles", {"cleo@example.org"}}})["locations"]["cleo@example.org"]["location"].contains(
       "timestamp"));
 }

@@ -120,6 +120,34 @@ TEST_F(ProgramTest, ServesUntilSigtermAndExitsCleanly) {
   EXPECT_EQ(output, "");
 }
 
+TEST_F(ProgramTest, MoveReachesTheRunningServerThroughItsControlFile) {
+  writeFileAtomically(dir / "friends.json", kData);
+  const auto control = dir / "control.json";
+  Run server = spawn({"--person", kPerson, "--data", (dir / "friends.json").string(), "--ca-out",
+                      (dir / "ca.pem").string(), "--control-file", control.string()});
+  const std::string ready = readLine(server.out);
+  const int port = std::stoi(ready.substr(ready.rfind(':') + 1));
+  EXPECT_EQ(std::filesystem::status(control).permissions() & std::filesystem::perms::all,
+            std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);  // it holds the secret
+
+  Run move = spawn({"move", "--control", control.string(), "ada@example.com", "-33.9", "-70.5"});
+  EXPECT_EQ(exitStatus(move.pid), 0) << readAll(move.err);
+  EXPECT_EQ(Json::parse(readAll(move.out))["location"]["longitude"], -70.5);
+  auto res = post(dir / "ca.pem", "127.0.0.1", port, kToken);
+  ASSERT_TRUE(res);
+  EXPECT_EQ(Json::parse(res->body)["locations"]["ada@example.com"]["location"]["latitude"], -33.9);
+
+  move = spawn({"move", "--control", control.string(), "eve@example.com", "1", "2"});
+  EXPECT_EQ(exitStatus(move.pid), 1);
+  EXPECT_NE(readAll(move.err).find("eve@example.com"), std::string::npos);
+  readAll(move.out);
+
+  ::kill(server.pid, SIGTERM);
+  EXPECT_EQ(exitStatus(server.pid), 0);
+  readAll(server.out);
+  readAll(server.err);
+}
+
 TEST_F(ProgramTest, AMissingDataSetIsAStartupError) {
   Run run = spawn({"--person", kPerson, "--data", (dir / "nothing.json").string()});
   EXPECT_EQ(exitStatus(run.pid), 2);

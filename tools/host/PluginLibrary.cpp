@@ -30,6 +30,9 @@ PluginLibrary::PluginLibrary(const std::filesystem::path& path) {
   resolve(friendPicture, "kyn_plugin_friend_picture");
   resolve(findPeople, "kyn_plugin_find_people");
   resolve(findPerson, "kyn_plugin_find_person");
+  resolve(signIn, "kyn_plugin_sign_in");
+  resolve(account, "kyn_plugin_account");
+  resolve(signOut, "kyn_plugin_sign_out");
   resolve(free, "kyn_plugin_free");
   resolve(shutdown, "kyn_plugin_shutdown");
 }
@@ -54,10 +57,14 @@ std::filesystem::path defaultPluginPath() {
   std::error_code ec;
   const auto self = std::filesystem::read_symlink("/proc/self/exe", ec);
   if (!ec) {
-    auto candidate = self.parent_path().parent_path() / "lib" / "libkyn-assistant.so";
-    if (std::filesystem::exists(candidate, ec)) return candidate;
+    // The build tree keeps the plug-in in ../lib; an installed program finds it in the library
+    // directory of its own prefix.
+    for (const char* libdir : {"../lib", KYN_LIBDIR_FROM_BINDIR}) {
+      auto candidate = (self.parent_path() / libdir / KYN_PLUGIN_FILE).lexically_normal();
+      if (std::filesystem::exists(candidate, ec)) return candidate;
+    }
   }
-  return "libkyn-assistant.so";
+  return KYN_PLUGIN_FILE;
 }
 
 }  // namespace kyn::host

@@ -37,6 +37,9 @@ class PluginLibrary {
   decltype(&kyn_plugin_friend_picture) friendPicture = nullptr;
   decltype(&kyn_plugin_find_people) findPeople = nullptr;
   decltype(&kyn_plugin_find_person) findPerson = nullptr;
+  decltype(&kyn_plugin_sign_in) signIn = nullptr;
+  decltype(&kyn_plugin_account) account = nullptr;
+  decltype(&kyn_plugin_sign_out) signOut = nullptr;
   decltype(&kyn_plugin_free) free = nullptr;
   decltype(&kyn_plugin_shutdown) shutdown = nullptr;
 
@@ -49,8 +52,9 @@ class PluginLibrary {
   void* handle_ = nullptr;
 };
 
-/// The plug-in beside the running program (../lib/libkyn-assistant.so), else the bare file name,
-/// which the dynamic loader looks up in its own search path.
+/// The plug-in in the library directory beside the running program's (../lib in the build tree, the
+/// installed library directory after an install), else its bare SONAME, which the dynamic loader
+/// looks up in its own search path.
 [[nodiscard]] std::filesystem::path defaultPluginPath();
 
 }  // namespace kyn::host

@@ -27,18 +27,40 @@ class UsageError : public std::runtime_error {
   using std::runtime_error::runtime_error;
 };
 
-/// What a command needs while it builds the assistant command and prints the reply.
+/// The options every command shares.
+struct Options {
+  std::string pluginPath;
+  std::string configDir;
+  std::string language;
+  bool json = false;
+  bool verbose = false;
+  double timeout = 60.0;
+  std::string picturesDir;  // where friends' pictures are written; empty: nowhere
+};
+
+/// What a command needs while it runs: the loaded, configured plug-in and the host's texts.
 struct Session {
   host::PluginLibrary& plugin;
   const Texts& texts;
+  const Options& options;
 };
 
-/// One command of the command line (search, command, ...).
+/// One command of the command line (search, account, ...).
 class HostCommand {
  public:
   virtual ~HostCommand() = default;
   /// Whether the user chose this command.
   [[nodiscard]] virtual bool chosen() const = 0;
+  /// Whether the configuration directory is made when it is missing (signing in).
+  [[nodiscard]] virtual bool makesConfigDirectory() const { return false; }
+  /// Runs the command; returns the exit status. Throws UsageError for options that do not fit.
+  virtual int run(Session& session) = 0;
+};
+
+/// A command that hands the plug-in one assistant command and prints its reply.
+class AssistantCommand : public HostCommand {
+ public:
+  int run(Session& session) final;
   /// The assistant command to perform; throws UsageError for options that do not fit.
   [[nodiscard]] virtual Json build(Session& session) = 0;
 };

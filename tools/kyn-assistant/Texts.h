@@ -37,6 +37,24 @@ enum class Text {
   CannotRead,        // %s: the file
   CannotWrite,       // %s: the file
   PictureSaved,      // %s: the friend's name, %s: the file
+  TokenPrompt,
+  SignedIn,          // %s: person id, %s: host
+  BadPersonId,       // %s: what was given
+  BadUsername,       // %s: what was given
+  BadHost,           // %s: what was given
+  BadToken,
+  NotWritten,
+  NoOneSignedIn,
+  SignedOut,
+  AccountPerson,     // %s
+  AccountUsername,   // %s
+  AccountHost,       // %s
+  TokenReadable,
+  TokenUnreadable,
+  AccountProvisioned,  // %s: yes or no
+  AccountRestricted,   // %s: yes or no
+  Yes,
+  No,
   Count
 };
 

@@ -2,9 +2,9 @@
 // assistant command, loads the plug-in with dlopen as an assistant does, performs the command,
 // waits for the one reply and prints it for a person to read (or as JSON).
 #include "Commands.h"
-#include "host/Reply.h"
 
 #include <cstdio>
+#include <filesystem>
 #include <iostream>
 #include <memory>
 
@@ -16,16 +16,6 @@ void printLog(int level, const char* message, void* /*context*/) {
   static const char* const names[] = {"debug", "info", "default", "error"};
   std::fprintf(stderr, "[plug-in %s] %s\n", (level >= 0 && level <= 3) ? names[level] : "log", message);
 }
-
-struct Options {
-  std::string pluginPath = kyn::host::defaultPluginPath().string();
-  std::string configDir;
-  std::string language;
-  bool json = false;
-  bool verbose = false;
-  std::string picturesDir;
-  double timeout = 60.0;
-};
 
 void defineOptions(CLI::App& app, Options& options) {
   app.set_help_all_flag("--help-all", "Show the help of every command");
@@ -53,6 +43,11 @@ void defineOptions(CLI::App& app, Options& options) {
 
 /// Loads and configures the plug-in, performs the chosen command and prints its reply.
 int run(const Options& options, HostCommand& chosen) {
+  if (chosen.makesConfigDirectory() && !options.configDir.empty()) {
+    std::error_code ec;
+    std::filesystem::create_directories(options.configDir, ec);
+    std::filesystem::permissions(options.configDir, std::filesystem::perms::owner_all, ec);
+  }
   std::unique_ptr<kyn::host::PluginLibrary> plugin;
   try {
     plugin = std::make_unique<kyn::host::PluginLibrary>(options.pluginPath);
@@ -71,35 +66,13 @@ int run(const Options& options, HostCommand& chosen) {
   }
   // The host speaks the language the plug-in settled on (the option, config.json's or the system's).
   const Texts texts(plugin->take(plugin->language()).value_or(options.language));
-  Session session{*plugin, texts};
-
-  Json command;
+  Session session{*plugin, texts, options};
   try {
-    command = chosen.build(session);
+    return chosen.run(session);
   } catch (const UsageError& e) {
     std::cerr << "kyn-assistant: " << e.what() << "\n";
     return kUsage;
   }
-
-  kyn::host::Reply box;
-  const std::string commandText = command.is_string() ? command.get<std::string>() : command.dump();
-  plugin->perform(commandText.c_str(), &kyn::host::Reply::receive, &box);
-  const auto reply = box.wait(std::chrono::duration<double>(options.timeout));
-  if (!reply) {
-    char seconds[32];
-    std::snprintf(seconds, sizeof seconds, "%g", options.timeout);
-    std::cerr << "kyn-assistant: " << texts.format(Text::NoAnswer, seconds) << "\n";
-    return kNoAnswer;
-  }
-  const Json parsed = Json::parse(*reply, nullptr, false);
-  if (options.json) std::cout << parsed.dump(2) << "\n";
-  else printReply(session, command, parsed, std::cout);
-  if (!options.picturesDir.empty()) {
-    savePictures(session, parsed, options.picturesDir, options.json ? nullptr : &std::cout, std::cerr);
-  }
-  if (parsed.value("class", "") != "AXCommandFailed") return kSuccess;
-  if (!options.json && !options.verbose) std::cerr << texts[Text::SeeVerbose] << "\n";
-  return kCommandFailed;
 }
 
 }  // namespace
@@ -107,10 +80,12 @@ int run(const Options& options, HostCommand& chosen) {
 int main(int argc, char** argv) {
   CLI::App app{"kyn-assistant: asks the Kyn plug-in where your friends are, as a voice assistant would."};
   Options options;
+  options.pluginPath = kyn::host::defaultPluginPath().string();
   defineOptions(app, options);
   std::vector<std::unique_ptr<HostCommand>> commands;
   commands.push_back(std::make_unique<SearchCommand>(app));
   commands.push_back(std::make_unique<RawCommand>(app));
+  commands.push_back(std::make_unique<AccountCommand>(app));
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& e) {

@@ -1,6 +1,6 @@
 #include "platform/config/Configuration.h"
 #include "platform/log/Log.h"
-#include "platform/sysinfo/SystemInfo.h"
+#include "platform/sysinfo/LinuxSystemInfo.h"
 #include "platform/value/Json.h"
 
 #include <fcntl.h>

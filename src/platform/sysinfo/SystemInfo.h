@@ -1,12 +1,9 @@
 #pragma once
 
-#include <filesystem>
 #include <optional>
 #include <string>
 
 namespace kyn::platform {
-
-class Configuration;
 
 /// The account that owns the service sign-in on this machine.
 class OwnerAccount {
@@ -50,63 +47,5 @@ class ServiceSession {
   /// Use of the service is restricted for this user or device.
   [[nodiscard]] virtual bool isRestricted() = 0;
 };
-
-/// The account file as read from disk. Fields of the wrong type read as absent.
-struct AccountFile {
-  std::optional<std::string> personId;
-  std::optional<std::string> username;
-  std::optional<std::string> serviceHost;
-  std::optional<bool> provisioned;
-  std::optional<bool> restricted;
-};
-
-/// Reads the account file: nothing when it is missing; nothing (logged) when it is empty, malformed
-/// or not a JSON object; a field of the wrong type is logged and read as absent.
-[[nodiscard]] std::optional<AccountFile> readAccountFile(const std::filesystem::path& file);
-
-/// Reads the application token: the environment variable KYN_APP_TOKEN when it is set and not empty,
-/// otherwise the token file. The file must be a regular file owned by this user that no one else may
-/// read or write; any other file is refused with a log line. Surrounding blanks are trimmed; an empty
-/// token is none. The token itself is never logged.
-[[nodiscard]] std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile);
-
-/// Linux: the account from the configuration directory; device facts from the machine id (an
-/// application-specific derivation; the raw id never leaves the machine), DMI, os-release and uname.
-class LinuxSystemInfo final : public SystemInfo {
- public:
-  struct Paths {
-    std::filesystem::path accountFile;
-    std::filesystem::path tokenFile;
-    std::filesystem::path productName = "/sys/class/dmi/id/product_name";
-    std::filesystem::path osRelease = "/etc/os-release";
-  };
-
-  explicit LinuxSystemInfo(const Configuration& configuration);
-  explicit LinuxSystemInfo(Paths paths) : paths_(std::move(paths)) {}
-
-  std::optional<OwnerAccount> ownerAccount() override;
-  std::optional<std::string> deviceUDID() override;
-  std::optional<std::string> productType() override;
-  std::optional<std::string> osVersion() override;
-  std::optional<std::string> osBuildVersion() override;
-
- private:
-  Paths paths_;
-};
-
-/// The session facts kept in the account file: "provisioned" (default yes) and "restricted"
-/// (default no). Without an account nothing is provisioned.
-class AccountFileSession final : public ServiceSession {
- public:
-  explicit AccountFileSession(std::filesystem::path accountFile) : accountFile_(std::move(accountFile)) {}
-  bool isProvisionedForLocationSharing() override;
-  bool isRestricted() override;
-
- private:
-  std::filesystem::path accountFile_;
-};
-
-/// Reads KEY=value from an os-release text (quotes removed); nothing when the key is absent or empty.
-[[nodiscard]] std::optional<std::string> osReleaseField(std::string_view text, std::string_view key);
 
 }  // namespace kyn::platform

@@ -78,8 +78,9 @@ std::optional<BasicCredentials> parseBasicAuthorization(std::string_view header)
   return BasicCredentials{decoded->substr(0, colon), decoded->substr(colon + 1)};
 }
 
-Authoriser::Authoriser(std::string_view personId, std::string_view token)
-    : person_(digest(personId)), token_(digest(token)) {}
+void Authoriser::add(std::string_view personId, std::optional<std::string_view> token) {
+  accounts_.push_back({digest(personId), digest(token.value_or("")), token.has_value()});
+}
 
 Authoriser::Digest Authoriser::digest(std::string_view text) {
   Digest d{};
@@ -90,16 +91,21 @@ Authoriser::Digest Authoriser::digest(std::string_view text) {
   return d;
 }
 
-bool Authoriser::authorises(std::optional<std::string_view> authorization) const {
-  if (!authorization) return false;
+std::optional<std::size_t> Authoriser::account(std::optional<std::string_view> authorization) const {
+  if (!authorization) return std::nullopt;
   const auto credentials = parseBasicAuthorization(*authorization);
-  if (!credentials) return false;
-  // Digests have one length whatever was sent, so the comparison time tells nothing about the token.
+  if (!credentials) return std::nullopt;
+  // Digests have one length whatever was sent, and every account is compared, so the time taken
+  // tells nothing about any token.
   const Digest user = digest(credentials->user);
   const Digest password = digest(credentials->password);
-  const bool personMatches = CRYPTO_memcmp(user.data(), person_.data(), user.size()) == 0;
-  const bool tokenMatches = CRYPTO_memcmp(password.data(), token_.data(), password.size()) == 0;
-  return personMatches & tokenMatches;
+  std::optional<std::size_t> found;
+  for (std::size_t i = 0; i < accounts_.size(); ++i) {
+    const bool personMatches = CRYPTO_memcmp(user.data(), accounts_[i].person.data(), user.size()) == 0;
+    const bool tokenMatches = CRYPTO_memcmp(password.data(), accounts_[i].token.data(), password.size()) == 0;
+    if (accounts_[i].enabled & personMatches & tokenMatches & !found.has_value()) found = i;
+  }
+  return found;
 }
 
 }  // namespace kyn::sim

@@ -4,6 +4,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace kyn::sim {
 
@@ -19,20 +20,34 @@ struct BasicCredentials {
 /// Strict base64 (standard alphabet, padded); nothing for anything else.
 [[nodiscard]] std::optional<std::string> decodeBase64(std::string_view text);
 
-/// Decides whether a request's "Authorization" value carries the account's person id and token.
-/// Keeps only digests of the two, and compares digests in constant time.
+/// Decides which account, if any, a request's "Authorization" value signs in: the one whose person
+/// id and token it carries. Keeps only digests of the two, and compares every account's digests in
+/// constant time.
 class Authoriser {
  public:
-  Authoriser(std::string_view personId, std::string_view token);
+  Authoriser() = default;
+  Authoriser(std::string_view personId, std::string_view token) { add(personId, token); }
 
-  [[nodiscard]] bool authorises(std::optional<std::string_view> authorization) const;
+  /// Adds the next account; accounts are numbered from 0 in the order they are added. Without a
+  /// token the account keeps its number but cannot sign in.
+  void add(std::string_view personId, std::optional<std::string_view> token);
+
+  /// The number of the account signed in, or nothing.
+  [[nodiscard]] std::optional<std::size_t> account(std::optional<std::string_view> authorization) const;
+  [[nodiscard]] bool authorises(std::optional<std::string_view> authorization) const {
+    return account(authorization).has_value();
+  }
 
  private:
   using Digest = std::array<unsigned char, 32>;
   static Digest digest(std::string_view text);
 
-  Digest person_;
-  Digest token_;
+  struct Credentials {
+    Digest person;
+    Digest token;
+    bool enabled;
+  };
+  std::vector<Credentials> accounts_;
 };
 
 }  // namespace kyn::sim

@@ -26,9 +26,9 @@ std::string readFile(const std::filesystem::path& path) {
   return std::move(content).str();
 }
 
-void writeFileAtomically(const std::filesystem::path& path, std::string_view content) {
+void writeFileAtomically(const std::filesystem::path& path, std::string_view content, unsigned mode) {
   const std::filesystem::path temporary = path.string() + ".tmp." + std::to_string(::getpid());
-  const int fd = ::open(temporary.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, 0644);
+  const int fd = ::open(temporary.c_str(), O_WRONLY | O_CREAT | O_TRUNC | O_CLOEXEC, mode);
   if (fd < 0) throw fileError("cannot write", temporary, errno);
   std::size_t written = 0;
   while (written < content.size()) {

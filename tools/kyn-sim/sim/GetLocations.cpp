@@ -9,12 +9,6 @@
 
 namespace kyn::sim {
 
-namespace {
-
-// The request members this endpoint knows; none of them may be sent as null.
-constexpr const char* kOptionalMembers[] = {"handles", "myLocation", "requestedLocation", "label", "proximity",
-                                            "serverContext"};
-
 std::optional<Coordinate> requestCoordinate(const Json& request, const char* key) {
   const auto it = request.find(key);
   if (it == request.end()) return std::nullopt;
@@ -26,6 +20,8 @@ std::optional<Coordinate> requestCoordinate(const Json& request, const char* key
   }
   return Coordinate{lat->get<double>(), lon->get<double>()};
 }
+
+namespace {
 
 // The requested handles in order, each once; nothing when the request names none.
 std::vector<std::string> requestedHandles(const Json& request) {
@@ -62,45 +58,53 @@ struct Query {
 
 Json friendEntry(const Friend& f, const Query& q) {
   Json entry = {{"status", 200}, {"match", false}};
-  if (f.pending || !f.location) {
+  const Whereabouts& w = f.whereabouts;
+  if (f.pending || !w.location) {
     entry["location"] = nullptr;
     return entry;
   }
-  if (q.requestedLocation) entry["match"] = distanceInMeters(*f.coordinate, *q.requestedLocation) <= q.radius;
-  if (q.myLocation) entry["distanceInMeters"] = distanceText(distanceInMeters(*f.coordinate, *q.myLocation));
-  std::optional<std::int64_t> timestamp = f.timestampMs;
-  if (f.ageSeconds) timestamp = q.nowMs - *f.ageSeconds * 1000;
-  entry["location"] = locationWithTimestamp(*f.location, timestamp);
+  if (q.requestedLocation) entry["match"] = distanceInMeters(*w.coordinate, *q.requestedLocation) <= q.radius;
+  if (q.myLocation) entry["distanceInMeters"] = distanceText(distanceInMeters(*w.coordinate, *q.myLocation));
+  entry["location"] = locationAsSent(w, q.nowMs);
   return entry;
 }
 
 }  // namespace
 
-Json answerServerContext(const DataSet& data, const Json& request) {
-  Json context = data.serverContext;
+Json locationAsSent(const Whereabouts& whereabouts, std::int64_t nowMs) {
+  if (!whereabouts.location) return nullptr;
+  std::optional<std::int64_t> timestamp = whereabouts.timestampMs;
+  if (whereabouts.ageSeconds) timestamp = nowMs - *whereabouts.ageSeconds * 1000;
+  return locationWithTimestamp(*whereabouts.location, timestamp);
+}
+
+void checkEnvelope(const Json& request) {
+  if (!request.is_object()) throw BadRequest("the body must be a JSON object");
+  if (!request.contains("clientContext") || !request["clientContext"].is_object()) {
+    throw BadRequest("\"clientContext\" must be an object");
+  }
+  for (const auto& [key, value] : request.items()) {
+    if (value.is_null()) throw BadRequest("\"" + key + "\" is null; leave optional members out instead");
+  }
+  if (request.contains("serverContext") && !request["serverContext"].is_object()) {
+    throw BadRequest("\"serverContext\" must be an object");
+  }
+}
+
+Json answerServerContext(const Json& serverContext, const Json& request) {
+  Json context = serverContext;
   const auto sc = request.find("serverContext");
   if (sc != request.end() && sc->is_object() && sc->contains("clientId")) context["clientId"] = (*sc)["clientId"];
   context["authToken"] = kServerContextAuthToken;
   return context;
 }
 
-Json answerGetLocations(const DataSet& data, const Json& request, std::int64_t nowMs) {
-  if (!request.is_object()) throw BadRequest("the body must be a JSON object");
-  if (!request.contains("clientContext") || !request["clientContext"].is_object()) {
-    throw BadRequest("\"clientContext\" must be an object");
-  }
-  for (const char* key : kOptionalMembers) {
-    if (request.contains(key) && request[key].is_null()) {
-      throw BadRequest(std::string("\"") + key + "\" is null; leave optional members out instead");
-    }
-  }
+Json answerGetLocations(const AccountView& view, const Json& request, std::int64_t nowMs) {
+  checkEnvelope(request);
   for (const char* key : {"label", "proximity"}) {
     if (request.contains(key) && !request[key].is_string()) {
       throw BadRequest(std::string("\"") + key + "\" must be a string");
     }
-  }
-  if (request.contains("serverContext") && !request["serverContext"].is_object()) {
-    throw BadRequest("\"serverContext\" must be an object");
   }
 
   Query q;
@@ -112,9 +116,9 @@ Json answerGetLocations(const DataSet& data, const Json& request, std::int64_t n
 
   Json answer = Json::object();
   answer["statusCode"] = 200;
-  if (data.friends.empty()) {
+  if (view.friends.empty()) {
     answer["statusCode"] = 417;
-    answer["serverContext"] = answerServerContext(data, request);
+    answer["serverContext"] = answerServerContext(view.serverContext, request);
     return answer;
   }
 
@@ -122,14 +126,14 @@ Json answerGetLocations(const DataSet& data, const Json& request, std::int64_t n
   bool anyFriend = false;
   bool anyPending = false;
   if (handles.empty()) {
-    for (const auto& f : data.friends) {
+    for (const auto& f : view.friends) {
       locations[f.handle] = friendEntry(f, q);
       anyFriend = true;
       anyPending = anyPending || f.pending;
     }
   } else {
     for (const auto& h : handles) {
-      const Friend* f = data.findFriend(h);
+      const Friend* f = view.findFriend(h);
       // The entry is keyed by the handle as the client wrote it, so that it finds it again.
       locations[h] = f ? friendEntry(*f, q) : Json{{"status", 411}};
       anyFriend = anyFriend || f;
@@ -144,7 +148,7 @@ Json answerGetLocations(const DataSet& data, const Json& request, std::int64_t n
   answer["locations"] = std::move(locations);
   // Without "emails" a client walks the keys of "locations", which is what answering all means.
   if (!handles.empty()) answer["emails"] = handles;
-  answer["serverContext"] = answerServerContext(data, request);
+  answer["serverContext"] = answerServerContext(view.serverContext, request);
   return answer;
 }
 

@@ -26,6 +26,7 @@ Json requestLogLine(const Call& call, const Outcome& outcome, std::chrono::syste
   line["path"] = call.path;
   line["host"] = call.host;
   line["authorised"] = outcome.authorised;
+  line["account"] = outcome.account ? Json(*outcome.account) : Json(nullptr);
   line["handles"] = outcome.handles ? *outcome.handles : Json(nullptr);
   line["status"] = outcome.reply.delivery == Reply::Delivery::Reset ? Json(nullptr) : Json(outcome.reply.status);
   line["apiVersionHeader"] = call.apiVersion.has_value();
@@ -35,11 +36,11 @@ Json requestLogLine(const Call& call, const Outcome& outcome, std::chrono::syste
   return line;
 }
 
-RequestLog::RequestLog(const std::filesystem::path& path) : out_(path, std::ios::app | std::ios::binary) {
-  if (!out_) throw std::runtime_error("cannot open the log file " + path.string() + ": " + std::strerror(errno));
+JsonLinesFile::JsonLinesFile(const std::filesystem::path& path) : out_(path, std::ios::app | std::ios::binary) {
+  if (!out_) throw std::runtime_error("cannot open " + path.string() + ": " + std::strerror(errno));
 }
 
-void RequestLog::record(const Json& line) {
+void JsonLinesFile::record(const Json& line) {
   // Replace invalid UTF-8 rather than throw: handles come from clients and may be anything.
   const std::string text = line.dump(-1, ' ', false, Json::error_handler_t::replace);
   std::lock_guard lock(mutex_);

@@ -10,17 +10,17 @@
 
 namespace kyn::sim {
 
-/// The log record of one request: time, method, path, Host header, whether it was authorised, the
-/// request's "handles", the HTTP status sent (null when the connection was reset), the two
-/// protocol headers, and the scripted fault. Never the credentials.
+/// The log record of one request: time, method, path, Host header, whether it was authorised and
+/// as whom, the request's "handles", the HTTP status sent (null when the connection was reset), the
+/// two protocol headers, and the scripted fault. Never the credentials.
 [[nodiscard]] Json requestLogLine(const Call& call, const Outcome& outcome, std::chrono::system_clock::time_point time);
 
-/// An append-only file of JSON lines, one per request, each flushed at once so that a test that
-/// has its answer finds the line. Thread-safe.
-class RequestLog {
+/// An append-only file of JSON lines (requests, notifications), each flushed at once so that a
+/// test that has its answer finds the line. Thread-safe.
+class JsonLinesFile {
  public:
   /// Opens for appending; throws std::runtime_error naming the path when it cannot.
-  explicit RequestLog(const std::filesystem::path& path);
+  explicit JsonLinesFile(const std::filesystem::path& path);
 
   void record(const Json& line);
 

@@ -1,8 +1,11 @@
 #include "sim/Router.h"
 
+#include "sim/Control.h"
 #include "sim/Files.h"
 #include "sim/GetLocations.h"
+#include "sim/Settings.h"
 
+#include <algorithm>
 #include <cctype>
 #include <random>
 
@@ -63,22 +66,66 @@ std::optional<std::string> redirectLocation(std::string_view hostHeader, std::st
   return location;
 }
 
-Router::Router(DataSet data, Authoriser authoriser, RouterOptions options)
-    : data_(std::move(data)), authoriser_(std::move(authoriser)), options_(std::move(options)) {
-  addEndpoint(std::string(kGetLocationsPath),
-              [this](const Json& body, std::int64_t nowMs) { return getLocations(body, nowMs); }, true);
+std::optional<std::string> servicePath(std::string_view wordOrPath) {
+  for (const std::string_view path : {kGetLocationsPath, kShowHideLocationPath, kGeoFencePath}) {
+    if (wordOrPath == path || wordOrPath == path.substr(kServicePathPrefix.size())) return std::string(path);
+  }
+  return std::nullopt;
+}
+
+Router::Router(DataSet data, Authoriser authoriser, RouterOptions options, World::Sink notify)
+    : world_(std::move(data), std::move(notify)), authoriser_(std::move(authoriser)), options_(std::move(options)) {
+  addProtocolEndpoint(
+      kGetLocationsPath,
+      [this](std::size_t account, const Json& body, std::int64_t nowMs) {
+        return answerGetLocations(world_.view(account), body, nowMs);
+      },
+      true);
+  addProtocolEndpoint(
+      kShowHideLocationPath,
+      [this](std::size_t account, const Json& body, std::int64_t nowMs) {
+        return answerShowHideLocation(world_, account, body, nowMs);
+      },
+      true);
+  addProtocolEndpoint(
+      kGeoFencePath,
+      [this](std::size_t account, const Json& body, std::int64_t nowMs) {
+        return answerGeoFence(world_, account, body, nowMs);
+      },
+      true);
+  addEndpoint(
+      std::string(kMovePath),
+      [this](std::size_t, const Json& body, std::int64_t nowMs) {
+        try {
+          auto moved = answerMove(world_, body, nowMs);
+          if (!moved) return errorReply(404, "nobody in the data set has the handle " + body.value("handle", ""));
+          Json answer = {{"statusCode", 200}};
+          answer.update(*moved);
+          return jsonReply(200, answer);
+        } catch (const BadRequest& e) {
+          return errorReply(400, e.what());
+        }
+      },
+      false);
 }
 
 void Router::addEndpoint(std::string path, Endpoint endpoint, bool faultable) {
   routes_[std::move(path)] = Route{std::move(endpoint), faultable};
 }
 
-Reply Router::getLocations(const Json& body, std::int64_t nowMs) const {
-  try {
-    return jsonReply(200, answerGetLocations(data_, body, nowMs));
-  } catch (const BadRequest& e) {
-    return errorReply(400, e.what());
-  }
+void Router::addProtocolEndpoint(std::string_view path,
+                                 std::function<Json(std::size_t account, const Json& body, std::int64_t nowMs)> answer,
+                                 bool faultable) {
+  addEndpoint(
+      std::string(path),
+      [answer = std::move(answer)](std::size_t account, const Json& body, std::int64_t nowMs) {
+        try {
+          return jsonReply(200, answer(account, body, nowMs));
+        } catch (const BadRequest& e) {
+          return errorReply(400, e.what());
+        }
+      },
+      faultable);
 }
 
 Router::FaultPlan Router::planFault() {
@@ -122,9 +169,19 @@ Router::FaultPlan Router::planFault() {
 
 Outcome Router::handle(const Call& call, std::int64_t nowMs) {
   Outcome out;
-  out.authorised = authoriser_.authorises(call.authorization);
+  // Control paths steer the simulator itself: no redirect, no fault, and the control secret.
+  const bool control = call.path.rfind(kControlPathPrefix, 0) == 0;
+  std::optional<std::size_t> account;
+  if (control) {
+    out.authorised = options_.control && options_.control->authorises(call.authorization);
+    if (out.authorised) out.account = std::string(kControlUser);
+  } else {
+    account = authoriser_.account(call.authorization);
+    out.authorised = account.has_value();
+    if (account) out.account = world_.personId(*account);
+  }
 
-  if (options_.canonicalHost) {
+  if (options_.canonicalHost && !control) {
     if (auto location = redirectLocation(call.host, *options_.canonicalHost, port_, call.target)) {
       out.reply.status = 307;
       out.reply.contentType = "text/plain";
@@ -158,13 +215,16 @@ Outcome Router::handle(const Call& call, std::int64_t nowMs) {
   }
   if (body.is_object() && body.contains("handles")) out.handles = body["handles"];
 
-  FaultPlan plan = route->second.faultable ? planFault() : FaultPlan{};
+  const auto& paths = options_.faultPaths;
+  const bool faulted = route->second.faultable &&
+                       (paths.empty() || std::find(paths.begin(), paths.end(), call.path) != paths.end());
+  FaultPlan plan = faulted ? planFault() : FaultPlan{};
   out.fault = std::move(plan.name);
   if (plan.replaces) {
     out.reply = std::move(plan.replacement);
     return out;
   }
-  out.reply = route->second.endpoint(body, nowMs);
+  out.reply = route->second.endpoint(account.value_or(0), body, nowMs);
   out.reply.delay = plan.delay;
   out.reply.delivery = plan.delivery;
   return out;

@@ -4,6 +4,7 @@
 #include "sim/DataSet.h"
 #include "sim/Faults.h"
 #include "sim/Json.h"
+#include "sim/World.h"
 
 #include <atomic>
 #include <chrono>
@@ -21,6 +22,12 @@ namespace kyn::sim {
 /// Path prefix of every endpoint of the service.
 inline constexpr std::string_view kServicePathPrefix = "/kytrservice/friends/va/";
 inline constexpr std::string_view kGetLocationsPath = "/kytrservice/friends/va/getlocations";
+inline constexpr std::string_view kShowHideLocationPath = "/kytrservice/friends/va/showHideLocation";
+inline constexpr std::string_view kGeoFencePath = "/kytrservice/friends/va/geoFence";
+
+/// The endpoint path for a command word ("geoFence") or a path of the service; nothing when the
+/// service has no such endpoint.
+[[nodiscard]] std::optional<std::string> servicePath(std::string_view wordOrPath);
 
 /// An HTTP request, reduced to what the simulator decides on. Independent of the HTTP library.
 struct Call {
@@ -53,6 +60,7 @@ struct Reply {
 struct Outcome {
   Reply reply;
   bool authorised = false;
+  std::optional<std::string> account;  ///< the person id signed in ("kyn-sim" on control paths)
   std::optional<Json> handles;  ///< the request's "handles" when the body had them
   std::string fault;            ///< the scripted fault that shaped the reply, if any
 };
@@ -61,6 +69,8 @@ struct RouterOptions {
   std::optional<std::string> canonicalHost;  ///< redirect requests addressed to any other host
   Fault fault;
   std::optional<long> faultCount;  ///< apply the fault to this many requests; every request when unset
+  std::vector<std::string> faultPaths;  ///< endpoints the fault shapes; every endpoint of the service when empty
+  std::optional<Authoriser> control;    ///< who may use the control paths; nobody when unset
 };
 
 /// The host name of a Host header value: without the port, and without brackets for IPv6.
@@ -73,10 +83,12 @@ struct RouterOptions {
 /// Turns calls into replies: redirect, authorisation, endpoint, scripted faults. Thread-safe.
 class Router {
  public:
-  /// An endpoint gets the parsed body object and the time in ms since 1970.
-  using Endpoint = std::function<Reply(const Json& body, std::int64_t nowMs)>;
+  /// An endpoint gets the number of the account signed in (0 on control paths), the parsed body
+  /// and the time in ms since 1970.
+  using Endpoint = std::function<Reply(std::size_t account, const Json& body, std::int64_t nowMs)>;
 
-  Router(DataSet data, Authoriser authoriser, RouterOptions options);
+  /// `authoriser` numbers the accounts as the data set does; `notify` receives fence notifications.
+  Router(DataSet data, Authoriser authoriser, RouterOptions options, World::Sink notify = {});
   Router(const Router&) = delete;  // endpoints refer back to the router
   Router& operator=(const Router&) = delete;
 
@@ -88,7 +100,7 @@ class Router {
   /// Adds a POST endpoint with a JSON body; `faultable` endpoints obey the scripted fault.
   void addEndpoint(std::string path, Endpoint endpoint, bool faultable);
 
-  [[nodiscard]] const DataSet& data() const noexcept { return data_; }
+  [[nodiscard]] World& world() noexcept { return world_; }
 
  private:
   struct Route {
@@ -105,9 +117,11 @@ class Router {
     Reply::Delivery delivery = Reply::Delivery::Normal;
   };
   [[nodiscard]] FaultPlan planFault();
-  [[nodiscard]] Reply getLocations(const Json& body, std::int64_t nowMs) const;
+  void addProtocolEndpoint(std::string_view path,
+                           std::function<Json(std::size_t account, const Json& body, std::int64_t nowMs)> answer,
+                           bool faultable);
 
-  DataSet data_;
+  World world_;
   Authoriser authoriser_;
   RouterOptions options_;
   std::atomic<int> port_{0};

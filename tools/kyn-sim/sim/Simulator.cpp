@@ -1,5 +1,6 @@
 #include "sim/Simulator.h"
 
+#include "sim/Control.h"
 #include "sim/DataSet.h"
 #include "sim/Files.h"
 #include "sim/RequestLog.h"
@@ -45,6 +46,11 @@ void resetConnection(const httplib::Request& request) {
   ::connect(fd, &unspecified, sizeof unspecified);
 }
 
+void wipe(std::string& secret) {
+  secret.assign(secret.size(), '\0');
+  secret.clear();
+}
+
 }  // namespace
 
 std::string readTokenFile(const std::filesystem::path& path) {
@@ -57,6 +63,14 @@ std::string readTokenFile(const std::filesystem::path& path) {
   while (!token.empty() && std::isspace(static_cast<unsigned char>(token.back()))) token.pop_back();
   if (token.empty()) throw StartupError("token file " + path.string() + " is empty");
   return token;
+}
+
+std::pair<std::string, std::string> readAccountOption(std::string_view value) {
+  const auto colon = value.find(':');
+  if (colon == 0 || colon == std::string_view::npos || colon + 1 == value.size()) {
+    throw StartupError("--account takes ID:TOKENFILE, not \"" + std::string(value) + "\"");
+  }
+  return {std::string(value.substr(0, colon)), readTokenFile(std::string(value.substr(colon + 1)))};
 }
 
 std::vector<std::string> certificateNames(const Options& options) {
@@ -89,6 +103,26 @@ Simulator::Simulator(Options options) : options_(std::move(options)) {
   } catch (const std::exception& e) {
     throw StartupError("data set " + options_.dataPath.string() + ": " + e.what());
   }
+  // Account 0 is --person's; the data set numbers the others, which sign in once given a token.
+  data.accounts[0].personId = options_.personId;
+  Authoriser authoriser(options_.personId, options_.token);
+  for (std::size_t i = 1; i < data.accounts.size(); ++i) {
+    const std::string& id = data.accounts[i].personId;
+    if (id == options_.personId) throw StartupError("data set: accounts." + id + " is the --person account");
+    const auto given = std::find_if(options_.accounts.begin(), options_.accounts.end(),
+                                    [&](const auto& account) { return account.first == id; });
+    authoriser.add(id, given == options_.accounts.end() ? std::nullopt
+                                                         : std::optional<std::string_view>(given->second));
+  }
+  for (const auto& [id, token] : options_.accounts) {
+    const auto known = std::find_if(data.accounts.begin() + 1, data.accounts.end(),
+                                    [&](const Account& account) { return account.personId == id; });
+    if (known == data.accounts.end()) throw StartupError("--account " + id + ": the data set has no such account");
+    if (std::count_if(options_.accounts.begin(), options_.accounts.end(),
+                      [&](const auto& account) { return account.first == id; }) > 1) {
+      throw StartupError("--account " + id + " is given twice");
+    }
+  }
 
   ServerIdentity identity;
   try {
@@ -104,18 +138,27 @@ Simulator::Simulator(Options options) : options_(std::move(options)) {
       throw StartupError(std::string("--ca-out: ") + e.what());
     }
   }
-  if (options_.logFile) {
+  const auto open = [](const std::optional<std::filesystem::path>& path, const char* option) {
     try {
-      log_ = std::make_unique<RequestLog>(*options_.logFile);
+      return path ? std::make_unique<JsonLinesFile>(*path) : nullptr;
     } catch (const std::exception& e) {
-      throw StartupError(std::string("--log-file: ") + e.what());
+      throw StartupError(std::string(option) + ": " + e.what());
     }
-  }
+  };
+  log_ = open(options_.logFile, "--log-file");
+  notifications_ = open(options_.notificationsFile, "--notifications-file");
 
-  RouterOptions routing{options_.canonicalHost, options_.fault, options_.faultCount};
-  router_ = std::make_unique<Router>(std::move(data), Authoriser(options_.personId, options_.token), routing);
-  options_.token.assign(options_.token.size(), '\0');  // only the router's digest is needed from here on
-  options_.token.clear();
+  RouterOptions routing{options_.canonicalHost, options_.fault, options_.faultCount, options_.faultPaths, {}};
+  if (options_.controlFile) {
+    controlSecret_ = makeControlSecret();
+    routing.control = Authoriser(kControlUser, controlSecret_);
+  }
+  World::Sink notify;
+  if (notifications_) notify = [file = notifications_.get()](const Json& line) { file->record(line); };
+  router_ = std::make_unique<Router>(std::move(data), std::move(authoriser), std::move(routing), std::move(notify));
+  // Only the router's digests are needed from here on.
+  wipe(options_.token);
+  for (auto& account : options_.accounts) wipe(account.second);
 
   // The library takes its own references to the certificate and key.
   server_ = std::make_unique<httplib::SSLServer>(identity.serverCertificate.get(), identity.serverKey.get());
@@ -153,6 +196,18 @@ int Simulator::bind() {
     } catch (const std::exception& e) {
       throw StartupError(std::string("--port-file: ") + e.what());
     }
+  }
+  if (options_.controlFile) {
+    // A wildcard address is reached on loopback.
+    std::string host = options_.listen;
+    if (host == "0.0.0.0") host = "127.0.0.1";
+    if (host == "::") host = "::1";
+    try {
+      writeFileAtomically(*options_.controlFile, controlFileText({host, port, caPem_, controlSecret_}), 0600);
+    } catch (const std::exception& e) {
+      throw StartupError(std::string("--control-file: ") + e.what());
+    }
+    wipe(controlSecret_);
   }
   return port;
 }

@@ -12,6 +12,8 @@
 #include <optional>
 #include <stdexcept>
 #include <string>
+#include <string_view>
+#include <utility>
 #include <vector>
 
 namespace httplib {
@@ -31,11 +33,16 @@ struct Options {
   std::optional<std::filesystem::path> portFile;
   std::string personId;
   std::string token;  ///< secret: never printed or logged
+  /// Person id and token of each further account of the data set; the tokens are secrets too.
+  std::vector<std::pair<std::string, std::string>> accounts;
   std::filesystem::path dataPath;
   std::optional<std::string> canonicalHost;
   Fault fault;
   std::optional<long> faultCount;
+  std::vector<std::string> faultPaths;  ///< endpoint paths the fault shapes; all when empty
   std::optional<std::filesystem::path> logFile;
+  std::optional<std::filesystem::path> notificationsFile;
+  std::optional<std::filesystem::path> controlFile;
 };
 
 /// A start-up problem the user has to fix (bad option, data set, file); main exits with status 2.
@@ -47,6 +54,9 @@ class StartupError : public std::runtime_error {
 /// The application token from a file: its content without trailing white space. Throws StartupError
 /// (naming the file, never the content) when it cannot be read or is empty.
 [[nodiscard]] std::string readTokenFile(const std::filesystem::path& path);
+
+/// The person id and token of an --account value "ID:TOKENFILE". Throws StartupError.
+[[nodiscard]] std::pair<std::string, std::string> readAccountOption(std::string_view value);
 
 /// The names the server certificate carries: localhost, 127.0.0.1, 127.0.0.2, the extra hosts and
 /// the canonical host, each once.
@@ -62,8 +72,8 @@ class Simulator {
   Simulator(const Simulator&) = delete;
   Simulator& operator=(const Simulator&) = delete;
 
-  /// Binds the listening socket (connections queue from then on) and writes the port file.
-  /// Returns the port. Throws StartupError.
+  /// Binds the listening socket (connections queue from then on) and writes the port file and the
+  /// control file. Returns the port. Throws StartupError.
   int bind();
 
   /// Serves until `stop()`; returns when every connection thread has ended.
@@ -88,7 +98,9 @@ class Simulator {
   Options options_;
   std::string caPem_;
   std::unique_ptr<Router> router_;
-  std::unique_ptr<class RequestLog> log_;
+  std::unique_ptr<class JsonLinesFile> log_;
+  std::unique_ptr<class JsonLinesFile> notifications_;
+  std::string controlSecret_;  ///< until the control file has it
   std::unique_ptr<httplib::SSLServer> server_;
   std::function<void(const Json&)> observer_;
   int port_ = 0;

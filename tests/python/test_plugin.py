@@ -1,0 +1,103 @@
+"""The Python module against kyn-sim over real HTTPS: blocking and asyncio commands, the log, refusals."""
+
+import asyncio
+import json
+import logging
+import os
+import subprocess
+import tempfile
+import unittest
+
+from kyn_assistant import KynError, Plugin
+
+PERSON = "P-2000001"
+TOKEN = "tok-python-7c1d"
+FRIENDS = {"friends": {"ada@example.com": {
+    "location": {"latitude": 45.5152, "longitude": -122.6784, "labels": [{"label": "Work"}]}, "ageSeconds": 300}}}
+ADA = ("BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
+       "EMAIL:ada@example.com\r\nPHOTO;ENCODING=b;TYPE=PGM:UDUKMiAxCjI1NQoQ8A==\r\nEND:VCARD\r\n")
+
+
+def write(path, text, mode=0o644):
+    os.makedirs(os.path.dirname(path), exist_ok=True)
+    with open(path, "w", encoding="utf-8") as out:
+        out.write(text)
+    os.chmod(path, mode)
+
+
+class PluginAgainstSim(unittest.TestCase):
+    @classmethod
+    def setUpClass(cls):
+        cls.work = tempfile.TemporaryDirectory()
+        root = cls.work.name
+        write(f"{root}/sim/token", TOKEN, 0o600)
+        write(f"{root}/sim/friends.json", json.dumps(FRIENDS))
+        cls.sim = subprocess.Popen([os.environ["KYN_SIM"], "--person", PERSON, "--token-file", f"{root}/sim/token",
+                                    "--data", f"{root}/sim/friends.json", "--ca-out", f"{root}/sim/ca.pem"],
+                                   stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True)
+        line = cls.sim.stdout.readline()
+        port = line.rsplit(":", 1)[-1].strip()
+        cls.config = f"{root}/config"
+        write(f"{cls.config}/account.json",
+              json.dumps({"personId": PERSON, "username": "sam@example.com", "serviceHost": f"localhost:{port}"}))
+        write(f"{cls.config}/token", TOKEN, 0o600)
+        write(f"{cls.config}/config.json", json.dumps({"caFile": f"{root}/sim/ca.pem"}))
+        write(f"{cls.config}/contacts/ada.vcf", ADA)
+        cls.plugin = Plugin(cls.config, language="en-US")
+        cls.plugin.set_log_level(logging.DEBUG)
+
+    @classmethod
+    def tearDownClass(cls):
+        cls.plugin.close()
+        cls.sim.terminate()
+        cls.sim.wait()
+        cls.sim.stdout.close()
+        cls.work.cleanup()
+
+    def test_a_search_names_the_friend_and_forwards_the_log(self):
+        with self.assertLogs("kyn_assistant", logging.DEBUG) as log:
+            reply = self.plugin.search(friends=["ada@example.com"], here=(45.5231, -122.6765))
+        self.assertEqual(reply["class"], "AXKynSearchCompleted", reply)
+        described = self.plugin.describe(reply["kynLocations"][0])
+        self.assertEqual(described["name"], "Ada Marlowe")
+        self.assertEqual(described["place"], "Work")
+        self.assertTrue(self.plugin.describe(reply["kynLocations"][0], here=(45.5231, -122.6765))["distance"]
+                        .endswith(" away"))
+        self.assertEqual(self.plugin.picture(reply["kynLocations"][0]), (b"P5\n2 1\n255\n\x10\xf0", 2, 1))
+        self.assertTrue(any("getlocations" in line for line in log.output), log.output)
+        self.assertFalse(any(TOKEN in line for line in log.output))
+
+    def test_concurrent_async_searches_are_each_answered(self):
+        async def many():
+            return await asyncio.gather(*(self.plugin.search_async(friends=["Ada"]) for _ in range(6)))
+
+        replies = asyncio.run(many())
+        self.assertEqual([r["class"] for r in replies], ["AXKynSearchCompleted"] * 6)
+
+    def test_failures_come_back_as_replies_or_errors(self):
+        self.assertEqual(self.plugin.search(), {"class": "AXCommandFailed",
+                                                "reason": "Need at least emails or current location"})
+        with self.assertRaises(KynError):
+            self.plugin.search(friends=["Nobody Known"])
+        with self.assertRaises(KynError):
+            Plugin(os.path.join(self.work.name, "missing"))
+
+
+class AccountAndClosedPlugin(unittest.TestCase):
+    def test_sign_in_show_and_out_then_a_closed_plugin_refuses_commands(self):
+        with tempfile.TemporaryDirectory() as config:
+            plugin = Plugin(config)
+            with self.assertRaises(ValueError):
+                plugin.sign_in("P-1", "sam", "https://example.com/", "t0k")
+            self.assertIsNone(plugin.account())
+            plugin.sign_in("P-1", "sam", "example.com:8443", "t0k")
+            self.assertEqual(plugin.account()["serviceHost"], "example.com:8443")
+            self.assertNotIn("t0k", json.dumps(plugin.account()))
+            self.assertTrue(plugin.sign_out())
+            plugin.close()
+            with self.assertRaises(KynError):
+                plugin.search(here=(1.0, 2.0))
+
+
+if __name__ == "__main__":
+    unittest.main()

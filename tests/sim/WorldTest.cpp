@@ -1,0 +1,186 @@
+#include "sim/GetLocations.h"
+#include "sim/Settings.h"
+#include "sim/World.h"
+
+#include <gtest/gtest.h>
+
+namespace kyn::sim {
+namespace {
+
+constexpr std::int64_t kNow = 1'763'740'800'000;
+
+// Sam (account 0) with Ada, Bram (pending) and Bo as friends, and a place "Work" 11 km north of
+// home; Ada (account 1) with Sam as a friend; Cy (account 2) without friends.
+const char* const kData = R"({
+  "me": {"handle": "sam@example.com", "location": {"latitude": 45.0, "longitude": -122.0}, "ageSeconds": 10,
+         "places": {"Work": {"latitude": 45.1, "longitude": -122.0}}},
+  "friends": {"ada@example.com": {"location": {"latitude": 45.0, "longitude": -122.0}, "ageSeconds": 60},
+              "+15035550102": {"pending": true}, "bo@example.com": {}},
+  "accounts": {"1000000002": {"me": {"handle": "ada@example.com"}, "friends": {"sam@example.com": {}}},
+               "1000000003": {"me": {"handle": "cy@example.com"}}},
+  "gazetteer": [{"streetAddress": "1 Example Way", "locality": "Portland", "latitude": 45.2, "longitude": -122.0}]
+})";
+
+constexpr Coordinate kHome{45.0, -122.0};
+constexpr Coordinate kWork{45.1, -122.0};
+
+class WorldTest : public ::testing::Test {
+ protected:
+  static DataSet data() {
+    DataSet d = parseDataSet(kData);
+    d.accounts[0].personId = "1000000001";
+    return d;
+  }
+
+  Json setFence(Json patch, std::size_t account = 0) {
+    Json request = {{"clientContext", {{"locale", "en-US"}}},
+                    {"emails", {"ada@example.com", "+15035550101"}},  // Ada's second handle is no friend's
+                    {"isOn", "true"},
+                    {"address", ""},
+                    {"trigger", "enter"},
+                    {"onetimeonly", "false"},
+                    {"type", "NotifyMe"}};
+    request.update(patch);
+    return answerGeoFence(world, account, request, kNow);
+  }
+  static Json at(Coordinate c, double accuracy = 10) {
+    return {{"latitude", c.latitude},
+            {"longitude", c.longitude},
+            {"source", "assistant"},
+            {"horizontalAccuracy", accuracy}};
+  }
+  Json hide(std::size_t account, const Json& yesNo) {
+    return answerShowHideLocation(world, account,
+                                  {{"clientContext", Json::object()}, {"prefs", {{"hideLocation", yesNo}}}}, kNow);
+  }
+  // "fence transition" of each notification since the last call.
+  std::vector<std::string> fired() {
+    std::vector<std::string> out;
+    for (const auto& n : notes) out.push_back(n["fence"].get<std::string>() + " " + n["transition"].get<std::string>());
+    notes.clear();
+    return out;
+  }
+  Json seenBy(std::size_t account, const std::string& handle) {
+    return answerGetLocations(world.view(account), {{"clientContext", Json::object()}, {"handles", {handle}}},
+                              kNow)["locations"][handle]["location"];
+  }
+
+  std::vector<Json> notes;
+  World world{data(), [this](const Json& n) { notes.push_back(n); }};
+};
+
+TEST_F(WorldTest, HidingTakesTheLocationFromFriendsAndShowingBringsItBack) {
+  const auto visibility = [&](const Json& yesNo) { return hide(0, yesNo); };
+  const Json answer = visibility("Yes");
+  EXPECT_EQ(answer["statusCode"], 200);
+  EXPECT_EQ(answer["myInfo"],
+            Json({{"location", {{"latitude", 45.0}, {"longitude", -122.0}, {"timestamp", kNow - 10'000}}},
+                  {"preferredEmail", "sam@example.com"}}));
+  EXPECT_EQ(answer["serverContext"]["authToken"], kServerContextAuthToken);
+  EXPECT_TRUE(seenBy(1, "sam@example.com").is_null());
+  EXPECT_FALSE(seenBy(0, "ada@example.com").is_null());  // hiding is Sam's alone
+
+  EXPECT_EQ(visibility("No")["myInfo"]["preferredEmail"], "sam@example.com");
+  EXPECT_EQ(seenBy(1, "sam@example.com")["latitude"], 45.0);
+
+  for (const Json& bad : {Json("yes"), Json(true), Json(nullptr)}) {
+    EXPECT_THROW(visibility(bad), BadRequest) << bad;
+  }
+  EXPECT_THROW(answerShowHideLocation(world, 0, {{"clientContext", Json::object()}}, kNow), BadRequest);
+}
+
+TEST_F(WorldTest, EachGeofenceOutcomeHasItsCode) {
+  struct Case {
+    const char* what;
+    Json patch;
+    int status;
+    std::size_t account = 0;
+  };
+  const Case cases[] = {
+      {"a coordinate", {{"requestedLocation", at({45.2, -122.0})}, {"label", "Gym"}}, 200},
+      {"a place of the account", {{"label", "work"}}, 200},
+      {"an address of the gazetteer", {{"fullAddress", {{"streetAddress", "1  example WAY"}}}}, 200},
+      {"nothing: where the friend is now", {{"trigger", "exit"}}, 200},
+      {"switched off", {{"isOn", "false"}, {"label", "Work"}}, 221},
+      {"nobody's friend", {{"emails", {"eve@example.com"}}}, 411},
+      {"no handle at all", {{"emails", Json::array()}}, 411},
+      {"an account without friends", {{"emails", {"sam@example.com"}}}, 417, 2},
+      {"an unknown label", {{"label", "Gym"}, {"address", "Gym"}}, 521},
+      {"an unknown address", {{"address", "9 Nowhere Road\nPortland OR"}}, 535},
+      {"a pending friend who cannot be placed", {{"emails", {"+15035550102"}}}, 535},
+      {"a place too vague", {{"requestedLocation", at(kWork, 20'000)}}, 543},
+      {"an immediate fence that repeats", {{"label", "Work"}, {"trigger", "immediate"}}, 544},
+  };
+  for (const Case& c : cases) {
+    World fresh(data());
+    Json request = {{"clientContext", Json::object()}, {"emails", {"ada@example.com"}}, {"isOn", "true"},
+                    {"trigger", "enter"}, {"onetimeonly", "false"}, {"type", "NotifyMe"}};
+    request.update(c.patch);
+    const Json answer = answerGeoFence(fresh, c.account, request, kNow);
+    EXPECT_EQ(answer["statusCode"], c.status) << c.what;
+    EXPECT_EQ(answer.contains("fence"), c.status == 200) << c.what;
+    EXPECT_EQ(answer.contains("fullAddress"), c.status == 200) << c.what;
+    EXPECT_TRUE(answer.contains("serverContext")) << c.what;
+  }
+
+  const Json placed = setFence({{"fullAddress", {{"streetAddress", "1 Example Way"}, {"locality", "Portland"}}}});
+  EXPECT_EQ(placed["fence"]["emails"], Json({"ada@example.com"}));
+  EXPECT_EQ(placed["fence"]["latitude"], 45.2);
+  EXPECT_EQ(placed["fence"]["longitude"], -122.0);
+  EXPECT_EQ(placed["fullAddress"]["streetAddress"], "1 Example Way");
+
+  for (const Json& bad : {Json{{"isOn", true}}, Json{{"trigger", "arrive"}}, Json{{"trigger", ""}},
+                          Json{{"type", "NotifyAll"}}, Json{{"emails", "ada@example.com"}}, Json{{"label", nullptr}}}) {
+    EXPECT_THROW(setFence(bad), BadRequest) << bad;
+  }
+}
+
+TEST_F(WorldTest, OnlyFencesThatAreOnCountTowardsTheLimitPerFriend) {
+  for (int i = 0; i < 3; ++i) {
+    EXPECT_EQ(setFence({{"requestedLocation", at({46.0 + i, -122.0})}})["statusCode"], 200);
+  }
+  EXPECT_EQ(setFence({{"requestedLocation", at({46.0, -122.0})}})["statusCode"], 200);  // the same fence, changed
+  EXPECT_EQ(setFence({{"label", "Work"}})["statusCode"], 542);
+  EXPECT_EQ(setFence({{"requestedLocation", at({46.0, -122.0})}, {"isOn", "false"}})["statusCode"], 221);
+  EXPECT_EQ(setFence({{"label", "Work"}})["statusCode"], 200);
+}
+
+TEST_F(WorldTest, FencesFireAsPeopleCrossThem) {
+  // Ada is at home, inside the first two fences and outside the rest.
+  setFence({{"requestedLocation", at(kHome)}, {"trigger", "immediate"}, {"onetimeonly", "true"}});  // fence-1
+  setFence({{"requestedLocation", at(kHome)}, {"trigger", "exit"}, {"onetimeonly", "true"}});       // fence-2
+  setFence({{"label", "Work"}});                                                                    // fence-3
+  setFence({{"label", "Work"}, {"trigger", "immediate"}, {"onetimeonly", "true"}});                // fence-4
+  // fence-5, Ada's own: tell Sam when she gets to work.
+  setFence({{"emails", {"sam@example.com"}}, {"requestedLocation", at(kWork)}, {"type", "NotifyOthers"}}, 1);
+  ASSERT_EQ(fired(), std::vector<std::string>{"fence-1 immediate"});
+
+  ASSERT_TRUE(world.move("ADA@example.com", kWork, std::nullopt, kNow + 1000));
+  EXPECT_EQ(fired(), (std::vector<std::string>{"fence-2 exit", "fence-3 enter", "fence-4 enter", "fence-5 enter"}));
+  world.move("ada@example.com", kHome, std::nullopt, kNow + 2000);
+  EXPECT_EQ(fired(), std::vector<std::string>{});  // the one-time fences are spent
+  world.move("ada@example.com", kWork, std::nullopt, kNow + 3000);
+  const Json last = notes.at(0);
+  EXPECT_EQ(fired(), (std::vector<std::string>{"fence-3 enter", "fence-5 enter"}));
+  EXPECT_EQ(last["account"], "1000000001");
+  EXPECT_EQ(last["to"], Json({"sam@example.com"}));
+  EXPECT_EQ(last["about"], "ada@example.com");
+  EXPECT_EQ(last["place"], "Work");
+  EXPECT_EQ(last["time"], "2025-11-21T16:00:03.000Z");
+
+  // Hidden, Ada moves unseen; shown again, her fences judge where she is now.
+  hide(1, "Yes");
+  world.move("ada@example.com", kHome, std::nullopt, kNow + 4000);
+  world.move("ada@example.com", kWork, std::nullopt, kNow + 5000);
+  world.move("ada@example.com", kHome, std::nullopt, kNow + 6000);
+  EXPECT_EQ(fired(), std::vector<std::string>{});
+  hide(1, "No");
+  EXPECT_EQ(fired(), std::vector<std::string>{});  // she left work unseen: fence-3 is for arrivals
+  world.move("ada@example.com", kWork, std::nullopt, kNow + 7000);
+  EXPECT_EQ(fired(), (std::vector<std::string>{"fence-3 enter", "fence-5 enter"}));
+
+  EXPECT_FALSE(world.move("eve@example.com", kWork, std::nullopt, kNow));
+}
+
+}  // namespace
+}  // namespace kyn::sim
