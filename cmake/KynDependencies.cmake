@@ -24,3 +24,10 @@ find_library(STB_LIBRARY stb REQUIRED)
 add_library(kyn_stb INTERFACE)
 target_include_directories(kyn_stb SYSTEM INTERFACE ${STB_INCLUDE_DIR})
 target_link_libraries(kyn_stb INTERFACE ${STB_LIBRARY})
+
+# GeographicLib: Debian ships only a find module outside CMake's path.
+find_path(GEOGRAPHICLIB_INCLUDE_DIR GeographicLib/Geodesic.hpp REQUIRED)
+find_library(GEOGRAPHICLIB_LIBRARY GeographicLib REQUIRED)
+add_library(kyn_geographiclib INTERFACE)
+target_include_directories(kyn_geographiclib SYSTEM INTERFACE ${GEOGRAPHICLIB_INCLUDE_DIR})
+target_link_libraries(kyn_geographiclib INTERFACE ${GEOGRAPHICLIB_LIBRARY})

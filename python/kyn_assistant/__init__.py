@@ -122,7 +122,10 @@ class Plugin:
                      "kyn_plugin_find_person"):
             getattr(lib, name).restype = ctypes.c_void_p  # freed with kyn_plugin_free
         lib.kyn_plugin_language.argtypes = []
-        lib.kyn_plugin_describe_location.argtypes = [ctypes.c_char_p, ctypes.c_int]
+        lib.kyn_plugin_describe_location.argtypes = [ctypes.c_char_p, ctypes.c_int, ctypes.c_char_p]
+        lib.kyn_plugin_friend_picture.restype = ctypes.c_void_p  # freed with kyn_plugin_free
+        lib.kyn_plugin_friend_picture.argtypes = [ctypes.c_char_p, ctypes.POINTER(ctypes.c_size_t),
+                                                  ctypes.POINTER(ctypes.c_int), ctypes.POINTER(ctypes.c_int)]
         lib.kyn_plugin_find_people.argtypes = [ctypes.c_char_p]
         lib.kyn_plugin_find_person.argtypes = [ctypes.c_char_p]
         lib.kyn_plugin_free.argtypes = [ctypes.c_void_p]
@@ -299,11 +302,26 @@ class Plugin:
             raise KynError(f'no one named "{friend}" in the address book')
         raise KynError(f'"{friend}" could mean several people: ' + ", ".join(p.get("fullName", "?") for p in people))
 
-    def describe(self, location: Mapping[str, Any], located: bool = True) -> dict:
+    def describe(self, location: Mapping[str, Any], located: bool = True, here: Optional[Coordinate] = None) -> dict:
         """A friend location of a search reply for display, in the assistant's language: its
-        "name", "handle", "place", "age" and "spokenAge" (absent members left out)."""
-        text = self._take(self._lib.kyn_plugin_describe_location(json.dumps(location).encode(), int(located)))
+        "name", "handle", "place", "age", "spokenAge", "time" and, given where the user is, "distance"
+        (absent members left out)."""
+        current = None if here is None else json.dumps(_location(here)).encode()
+        text = self._take(self._lib.kyn_plugin_describe_location(json.dumps(location).encode(), int(located), current))
         return json.loads(text) if text else {}
+
+    def picture(self, location: Mapping[str, Any]) -> Optional[Tuple[bytes, int, int]]:
+        """The friend's contact picture as the address book stores it (JPEG, PNG, ...), with its width
+        and height in pixels; None when the friend has none."""
+        size, width, height = ctypes.c_size_t(), ctypes.c_int(), ctypes.c_int()
+        pointer = self._lib.kyn_plugin_friend_picture(json.dumps(location).encode(), ctypes.byref(size),
+                                                       ctypes.byref(width), ctypes.byref(height))
+        if not pointer:
+            return None
+        try:
+            return ctypes.string_at(pointer, size.value), width.value, height.value
+        finally:
+            self._lib.kyn_plugin_free(pointer)
 
     # ---- plumbing ----
 

@@ -75,8 +75,8 @@ ContactRef ContactsUtilities::findOptimalContactInContacts(const std::vector<Con
 }
 
 std::shared_ptr<const platform::Image> ContactsUtilities::imageForContact(const ContactRef& contact) {
-  if (!contact || !contact->imageData) return nullptr;
-  return platform::decodeImage(*contact->imageData);
+  if (!contact) return nullptr;
+  return platform::imageFromData(contact->imageData);
 }
 
 std::vector<std::string> ContactsUtilities::phoneNumbersForContact(const ContactRef& contact) {

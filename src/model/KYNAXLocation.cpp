@@ -7,6 +7,8 @@
 #include "platform/text/Unicode.h"
 #include "utils/KYNAXUtils.h"
 
+#include <cmath>
+
 namespace kyn {
 
 using platform::member;
@@ -14,6 +16,9 @@ using platform::memberNotNull;
 using platform::services;
 
 namespace {
+
+/// The distance calculator's own preferences domain.
+constexpr std::string_view kDistanceCalculatorSuiteName = "group.com.zanto.aerix.ky";
 
 /// A member that must be a JSON object to be read; anything else (null included) is absent.
 const Value* objectMember(const Value* object, std::string_view key) {
@@ -189,6 +194,78 @@ std::string KYNAXLocation::formatPhoneNumber(const std::string& number) const {
 
 std::string KYNAXLocation::unformatPhoneNumber(const std::string& number) const {
   return platform::keepCodePoints(number, [](char32_t c) { return c == U'+' || platform::isDecimalDigit(c); });
+}
+
+// ---- Presentation ----
+
+std::optional<std::string> KYNAXLocation::prettyTimestamp() const {
+  const double date = avixLocation ? avixLocation->locationDate.value_or(0.0) : 0.0;
+  if (date == 0.0 || !std::isfinite(date)) return std::nullopt;
+  const auto formatter = services().dateFormatting.get();
+  if (date > KYNAXUtils::todayAtMidnight()) return formatter->shortTime(date);
+  if (date > KYNAXUtils::yesterdayAtMidnight()) return platform::avixUILocalizedStringForKey("DATE_YESTERDAY");
+  return formatter->shortDateTime(date);
+}
+
+std::shared_ptr<platform::KYDistanceCalculator> KYNAXLocation::distanceCalculator() {
+  // Made on first use, once for the process; the initialisation of a local static is thread-safe.
+  static const std::shared_ptr<platform::KYDistanceCalculator> calculator = [] {
+    auto& s = services();
+    auto made = platform::KYDistanceCalculator::initWithDefaultsSuiteName(
+        kDistanceCalculatorSuiteName, s.assistantPreferences.get()->languageCode(), s.locale.get()->localeId());
+    made->setLocalizationDelegate(s.localization.get());
+    return made;
+  }();
+  return calculator;
+}
+
+std::optional<std::string> KYNAXLocation::distanceFromLocation(const std::shared_ptr<const platform::Location>& location) const {
+  if (!location || !avixLocation) return std::nullopt;
+  auto friendAt = std::make_shared<AXLocation>();
+  friendAt->latitude = avixLocation->latitude;
+  friendAt->longitude = avixLocation->longitude;
+  friendAt->accuracy = avixLocation->accuracy;
+  const auto destination = KYNAXUtils::coreLocationForAXLocation(friendAt);
+  if (!destination) return std::nullopt;
+  const auto calculator = distanceCalculator();
+  auto distance = calculator->localizedDistanceFromLocation(*location, *destination);
+  services().log().notice("Distance calculated: %@ for friend: %@ (Unit:%li)", distance, friendName(),
+                          calculator->measurementSystem());
+  return distance;
+}
+
+std::shared_ptr<const platform::Image> KYNAXLocation::friendImage() {
+  if (!cachedFriendImage) cachedFriendImage = friendImageForPersonAttribute(avixLocation ? avixLocation->friend_ : nullptr);
+  return cachedFriendImage;
+}
+
+std::shared_ptr<const platform::Image> KYNAXLocation::friendImageForPersonAttribute(
+    const std::shared_ptr<AXPersonAttribute>& attribute) {
+  const std::shared_ptr<AXPerson> person = attribute ? attribute->object : nullptr;
+  if (person) {
+    if (auto image = ContactsUtilities::imageForContact(ContactsUtilities::contactForAssistantId(person->identifier))) {
+      return image;
+    }
+  }
+  return friendImageForAXPerson(person);
+}
+
+std::shared_ptr<const platform::Image> KYNAXLocation::friendImageForAXPerson(const std::shared_ptr<const AXObject>& object) {
+  const auto person = std::dynamic_pointer_cast<const AXPerson>(object);
+  if (!person) return nullptr;
+  if (person->emails) {
+    for (const auto& email : *person->emails) {
+      if (!email) continue;
+      if (auto image = ContactsUtilities::imageForContact(ContactsUtilities::contactForEmail(email->emailAddress))) return image;
+    }
+  }
+  if (person->phones) {
+    for (const auto& phone : *person->phones) {
+      if (!phone) continue;
+      if (auto image = ContactsUtilities::imageForContact(ContactsUtilities::contactForPhone(phone->number))) return image;
+    }
+  }
+  return nullptr;
 }
 
 std::string KYNAXLocation::description() const {

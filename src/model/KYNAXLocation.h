@@ -4,6 +4,8 @@
 #include "platform/assistant/Model.h"
 #include "platform/image/Image.h"
 #include "platform/localization/Localization.h"
+#include "platform/location/DistanceCalculator.h"
+#include "platform/location/Location.h"
 #include "platform/value/Value.h"
 
 #include <memory>
@@ -69,12 +71,35 @@ class KYNAXLocation : public KYNAXBaseModel {
   /// Only the decimal digits (of any script) and "+", in order.
   [[nodiscard]] std::string unformatPhoneNumber(const std::string& number) const;
 
+  // ---- Presentation ----
+
+  /// When the friend was located: the time alone after today's midnight, the localised
+  /// "DATE_YESTERDAY" after yesterday's, else the date and time. Nothing without a date (or with a
+  /// date of exactly 0). Exactly today's midnight reads as yesterday, exactly yesterday's as a date.
+  [[nodiscard]] virtual std::optional<std::string> prettyTimestamp() const;
+  /// How far the friend is from `location`, in the user's words and units; nothing without either
+  /// location or without a coordinate of the friend.
+  [[nodiscard]] std::optional<std::string> distanceFromLocation(const std::shared_ptr<const platform::Location>& location) const;
+  /// The process's one distance calculator: words in the assistant's language, units of the
+  /// system locale's region.
+  [[nodiscard]] static std::shared_ptr<platform::KYDistanceCalculator> distanceCalculator();
+  /// The friend's full contact picture, looked up once found (not again after a find).
+  [[nodiscard]] std::shared_ptr<const platform::Image> friendImage();
+  /// The picture of the contact behind the person's identifier, else `friendImageForAXPerson`.
+  [[nodiscard]] static std::shared_ptr<const platform::Image> friendImageForPersonAttribute(
+      const std::shared_ptr<AXPersonAttribute>& attribute);
+  /// The first picture among the contacts of the person's e-mail addresses, then of its phone
+  /// numbers, in order; nothing for an object that is not a person.
+  [[nodiscard]] static std::shared_ptr<const platform::Image> friendImageForAXPerson(const std::shared_ptr<const AXObject>& object);
+
   [[nodiscard]] std::string description() const override;
 
   std::shared_ptr<AXKynLocation> avixLocation;
   std::shared_ptr<const platform::Image> cachedFriendImage;
 
  protected:
+  /// A record with nothing decoded yet, for subclasses that decode themselves.
+  KYNAXLocation() = default;
   [[nodiscard]] std::shared_ptr<AXPerson> friendPerson() const;
 };
 

@@ -38,6 +38,10 @@ Services::Services()
       calendar([] { return std::make_shared<IcuCalendar>(); }),
       localization([] { return std::make_shared<IcuLocalization>(); }),
       numberFormatting([] { return std::make_shared<IcuNumberFormatting>(); }),
+      dateFormatting([this] {
+        return std::make_shared<IcuDateFormatting>(
+            presentationLocaleId(assistantPreferences.get()->languageCode(), locale.get()->localeId()));
+      }),
       assistantPreferences([this] {
         auto language = configuration()->language();
         if (!language) language = systemLanguageTag();
@@ -79,6 +83,7 @@ void Services::resetSlots() {
   calendar.set(nullptr);
   localization.set(nullptr);
   numberFormatting.set(nullptr);
+  dateFormatting.set(nullptr);
   assistantPreferences.set(nullptr);
   locale.set(nullptr);
   contactStore.set(nullptr);

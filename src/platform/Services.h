@@ -14,6 +14,7 @@
 #include "platform/prefs/PreferencesStore.h"
 #include "platform/sysinfo/SystemInfo.h"
 #include "platform/time/Clock.h"
+#include "platform/time/DateFormatting.h"
 
 #include <filesystem>
 #include <functional>
@@ -66,6 +67,8 @@ class Services {
   ServiceSlot<Calendar> calendar;
   ServiceSlot<Localization> localization;
   ServiceSlot<NumberFormatting> numberFormatting;
+  /// In the assistant's language with the conventions of the system locale's region.
+  ServiceSlot<DateFormatting> dateFormatting;
   ServiceSlot<AssistantPreferences> assistantPreferences;
   ServiceSlot<LocaleInfo> locale;
   ServiceSlot<ContactStore> contactStore;

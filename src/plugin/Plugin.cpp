@@ -87,6 +87,15 @@ char* copyText(const std::string& text) {
   return out;
 }
 
+constexpr platform::JsonLimits kDescribeLimits{kMaxCommandBytes, 64};
+
+/// A friend location of a reply, wrapped as it is; nothing for a text that is no JSON object.
+std::shared_ptr<KYNAXLocation> friendLocationFromJson(const char* json) {
+  const auto parsed = platform::parseJson(json, kDescribeLimits);
+  if (!parsed || !parsed->is_object()) return nullptr;
+  return KYNAXLocation::locationWithAvixLocation(AXKynLocation::fromDictionary(*parsed));
+}
+
 std::shared_ptr<AXPerson> personForContact(const platform::Contact& contact) {
   auto person = std::make_shared<AXPerson>();
   ContactsUtilities::fillPersonFromContact(contact, *person);
@@ -189,12 +198,11 @@ int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void*
   return 0;
 }
 
-char* kyn_plugin_describe_location(const char* location_json, int located) {
+char* kyn_plugin_describe_location(const char* location_json, int located, const char* current_location_json) {
   if (location_json == nullptr) return nullptr;
   try {
-    const auto parsed = platform::parseJson(location_json, platform::JsonLimits{plugin::kMaxCommandBytes, 64});
-    if (!parsed || !parsed->is_object()) return nullptr;
-    const auto record = KYNAXLocation::locationWithAvixLocation(AXKynLocation::fromDictionary(*parsed));
+    const auto record = plugin::friendLocationFromJson(location_json);
+    if (!record) return nullptr;
     Value out = Value::object();
     if (auto name = record->friendName()) out["name"] = *name;
     if (auto handle = record->friendHandlePretty()) out["handle"] = *handle;
@@ -204,7 +212,34 @@ char* kyn_plugin_describe_location(const char* location_json, int located) {
       out["age"] = age[std::string(LabelStringKey)];
       out["spokenAge"] = age[std::string(LabelAccessibilityStringKey)];
     }
+    if (auto time = record->prettyTimestamp()) out["time"] = *time;
+    if (current_location_json != nullptr) {
+      const auto here = platform::parseJson(current_location_json, plugin::kDescribeLimits);
+      if (here && here->is_object()) {
+        const auto from = KYNAXUtils::coreLocationForAXLocation(AXLocation::fromDictionary(*here));
+        if (auto distance = record->distanceFromLocation(from)) out["distance"] = *distance;
+      }
+    }
     return plugin::copyText(platform::toJson(out));
+  } catch (...) {
+    return nullptr;
+  }
+}
+
+unsigned char* kyn_plugin_friend_picture(const char* location_json, size_t* size, int* width, int* height) {
+  if (location_json == nullptr) return nullptr;
+  try {
+    const auto record = plugin::friendLocationFromJson(location_json);
+    const auto image = record ? record->friendImage() : nullptr;
+    if (!image || !image->encoded || image->encoded->empty()) return nullptr;
+    const auto& bytes = *image->encoded;
+    auto* out = static_cast<unsigned char*>(std::malloc(bytes.size()));
+    if (out == nullptr) return nullptr;
+    std::memcpy(out, bytes.data(), bytes.size());
+    if (size != nullptr) *size = bytes.size();
+    if (width != nullptr) *width = image->width;
+    if (height != nullptr) *height = image->height;
+    return out;
   } catch (...) {
     return nullptr;
   }
@@ -283,7 +318,7 @@ int kyn_plugin_sign_out(void) {
   }
 }
 
-void kyn_plugin_free(char* text) { std::free(text); }
+void kyn_plugin_free(void* memory) { std::free(memory); }
 
 void kyn_plugin_shutdown(void) {
   try {

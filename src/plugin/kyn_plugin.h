@@ -43,10 +43,21 @@ void kyn_plugin_set_log_callback(kyn_log_callback callback, void* context);
 int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void* context);
 
 /* Describes a friend location of a search reply (an "AXKynLocation" object as JSON) for display, in
- * the assistant's language: a JSON object {"name", "handle", "place", "age", "spokenAge"} (absent
- * members left out). `located` is non-zero once the search has ended. Free the text with
- * kyn_plugin_free. NULL for a text that is no JSON object. */
-char* kyn_plugin_describe_location(const char* location_json, int located);
+ * the assistant's language with the conventions and units of the system's region: a JSON object
+ * {"name", "handle", "place", "age", "spokenAge", "time", "distance"} (absent members left out).
+ * "time" is when the friend was located: a time of day today, the word for yesterday, or a date and
+ * time before that. "distance" is how far the friend is from `current_location_json` (the user's
+ * position as an "AXLocation" object with its latitude and longitude; NULL: no distance), such as
+ * "1.2 km away". `located` is non-zero once the search has ended. Free the text with
+ * kyn_plugin_free. NULL for a location text that is no JSON object. */
+char* kyn_plugin_describe_location(const char* location_json, int located, const char* current_location_json);
+
+/* The contact picture of the friend of a friend location (an "AXKynLocation" object as JSON): the
+ * full picture of the friend's contact in the address book, as the card stores it (JPEG, PNG, ...).
+ * Returns the bytes, their count in *size and the picture's width and height in pixels in *width and
+ * *height (each pointer may be NULL). NULL when the friend has no picture that decodes, or for a
+ * text that is no JSON object. Free the bytes with kyn_plugin_free. */
+unsigned char* kyn_plugin_friend_picture(const char* location_json, size_t* size, int* width, int* height);
 
 /* The people of the user's address book whose name holds `name`, ignoring case: a JSON array of
  * "AXPerson" objects with their e-mail addresses and phone numbers, for turning a spoken name into a
@@ -84,8 +95,8 @@ char* kyn_plugin_account(void);
 /* Signs out: removes account.json and the token file. Returns 0, or 1 when no one was signed in. */
 int kyn_plugin_sign_out(void);
 
-/* Frees a text returned by the plug-in. */
-void kyn_plugin_free(char* text);
+/* Frees a text or picture returned by the plug-in. */
+void kyn_plugin_free(void* memory);
 
 /* Completes every command in flight (as failed) and stops the network thread; call it before
  * dlclose. A later command starts the thread again. */

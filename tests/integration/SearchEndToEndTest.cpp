@@ -26,9 +26,11 @@ const Json kFriends = Json::parse(R"({
   "serverContext": {"minCallbackIntervalInMS": 5000}
 })");
 
+// Ada's card carries a 2x1 grey picture.
+const char* kAdaPicture = "P5\n2 1\n255\n\x10\xF0";
 const char* kAdaCard =
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
-    "EMAIL;TYPE=HOME:ada@example.com\r\nEND:VCARD\r\n";
+    "EMAIL;TYPE=HOME:ada@example.com\r\nPHOTO;ENCODING=b;TYPE=PGM:UDUKMiAxCjI1NQoQ8A==\r\nEND:VCARD\r\n";
 const char* kBramCard =
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:bram-1\r\nFN:Bram Tolliver\r\nN:Tolliver;Bram;;;\r\n"
     "TEL;TYPE=CELL:(503) 555-0102\r\nEND:VCARD\r\n";
@@ -269,7 +271,7 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
     plugin.configure(configDir.path(), "de");
     auto describe = reinterpret_cast<decltype(&kyn_plugin_describe_location)>(plugin.symbol("kyn_plugin_describe_location"));
     auto release = reinterpret_cast<decltype(&kyn_plugin_free)>(plugin.symbol("kyn_plugin_free"));
-    char* text = describe(location.c_str(), 1);
+    char* text = describe(location.c_str(), 1, nullptr);
     ASSERT_NE(text, nullptr) << "load " << load;
     const Json described = Json::parse(text);
     release(text);
@@ -295,6 +297,7 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
                                  "45.5231,-122.6765,30"});
   EXPECT_EQ(found.status, 0) << found.output;
   EXPECT_NE(found.output.find("Ada Marlowe — Work · 45.51520, -122.67840 · "), std::string::npos) << found.output;
+  EXPECT_NE(found.output.find(" away\n"), std::string::npos) << found.output;  // the plug-in's distance text
   EXPECT_EQ(sim->requests().back()["handles"], Json::parse(R"(["ada@example.com"])"));
 
   // A handle the address book holds is completed into the contact's person, as an assistant does;
@@ -307,6 +310,16 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "Nobody Known"}).status, 2);
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--here", "95,1"}).status, 2);
   EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", (configDir.path() / "missing").string(), "search"}).status, 2);
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
+
+  // Pictures are written as the address book holds them, named after the handle.
+  const test::TempDir pictures;
+  const auto withPictures = runProgram({KYN_CLI_PATH, "--config", config, "--pictures", pictures.path().string(),
+                                        "search", "--friend", "ada@example.com", "--friend", "+15035550102"});
+  EXPECT_EQ(withPictures.status, 0) << withPictures.output;
+  std::ifstream picture(pictures.path() / "ada@example.com.pnm", std::ios::binary);
+  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(picture), {}), kAdaPicture);
+  EXPECT_EQ(std::distance(std::filesystem::directory_iterator(pictures.path()), {}), 1);  // Bram has none
 
   std::filesystem::remove(configDir.path() / "account.json");
   const auto signedOut = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"});
@@ -314,6 +327,61 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   EXPECT_NE(signedOut.output.find("not signed in"), std::string::npos) << signedOut.output;
   const auto german = runProgram({KYN_CLI_PATH, "--config", config, "--language", "de", "search", "--friend", "ada@example.com"});
   EXPECT_EQ(german.output, "Du bist nicht bei Kyn angemeldet, oder der Server hat die Anmeldung nicht angenommen.\n");
+}
+
+}  // namespace
+}  // namespace kyn::itest
+
+namespace kyn::itest {
+namespace {
+
+// What a host shows of a friend beside the reply: the distance from where the user is, the time of
+// the fix, and the friend's picture as the address book stores it.
+TEST(PluginPresentation, DistanceTimeAndPictureOfAFriend) {
+  test::TempDir configDir;
+  Account account(configDir.path());
+  account.write("localhost:1", std::nullopt);
+  account.addCard("ada.vcf", kAdaCard);
+  Plugin plugin;
+  plugin.configure(configDir.path(), "de");
+  auto describe = reinterpret_cast<decltype(&kyn_plugin_describe_location)>(plugin.symbol("kyn_plugin_describe_location"));
+  auto picture = reinterpret_cast<decltype(&kyn_plugin_friend_picture)>(plugin.symbol("kyn_plugin_friend_picture"));
+  auto release = reinterpret_cast<decltype(&kyn_plugin_free)>(plugin.symbol("kyn_plugin_free"));
+  const double threeDaysAgo = std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count() -
+                              978'307'200.0 - 3 * 86'400.0;
+  const Json location = {{"class", "AXKynLocation"},
+                         {"friend", {{"class", "AXPersonAttribute"},
+                                     {"object", {{"class", "AXPerson"},
+                                                 {"emails", {{{"class", "AXEmail"}, {"emailAddress", "ada@example.com"}}}}}}}},
+                         {"latitude", 45.5152},
+                         {"longitude", -122.6784},
+                         {"locationDate", threeDaysAgo}};
+  auto described = [&](const char* here) {
+    char* text = describe(location.dump().c_str(), 1, here);
+    EXPECT_NE(text, nullptr);
+    const Json out = text ? Json::parse(text) : Json();
+    release(text);
+    return out;
+  };
+  const Json withHere = described(R"({"class":"AXLocation","latitude":45.5231,"longitude":-122.6765})");
+  EXPECT_TRUE(withHere.value("distance", "").ends_with(" entfernt")) << withHere.dump();
+  EXPECT_FALSE(withHere.value("time", "").empty()) << withHere.dump();
+  EXPECT_NE(withHere.value("time", ""), "Gestern");
+  EXPECT_FALSE(described(nullptr).contains("distance"));
+  EXPECT_FALSE(described(R"({"class":"AXLocation"})").contains("distance"));  // no coordinate
+
+  std::size_t size = 0;
+  int width = 0, height = 0;
+  unsigned char* bytes = picture(location.dump().c_str(), &size, &width, &height);
+  ASSERT_NE(bytes, nullptr);
+  EXPECT_EQ(std::string(reinterpret_cast<const char*>(bytes), size), kAdaPicture);
+  EXPECT_EQ(width, 2);
+  EXPECT_EQ(height, 1);
+  release(bytes);
+  Json stranger = location;
+  stranger["friend"]["object"]["emails"][0]["emailAddress"] = "stranger@example.net";
+  EXPECT_EQ(picture(stranger.dump().c_str(), &size, nullptr, nullptr), nullptr);
+  EXPECT_EQ(picture("[]", &size, nullptr, nullptr), nullptr);
 }
 
 }  // namespace

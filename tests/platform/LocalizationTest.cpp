@@ -11,7 +11,7 @@ const char* const kKeys[] = {
     "ACCESSIBILITY_LOCATED_LESS_THAN_30SECONDS", "LOCATED_MINUTES", "ACCESSIBILITY_LOCATED_MINUTE",
     "ACCESSIBILITY_LOCATED_MINUTES", "LOCATED_LESS_THAN_1HR", "ACCESSIBILITY_LOCATED_LESS_THAN_1HR",
     "LOCATED_MORE_THAN_1HR", "ACCESSIBILITY_LOCATED_MORE_THAN_1HR", "CITY_STATE_LABEL", "LOCATING",
-    "NO_LOCATION", "DATE_YESTERDAY", "HIDDEN_LOCATION"};
+    "NO_LOCATION", "DATE_YESTERDAY", "HIDDEN_LOCATION", "DISTANCE_AWAY"};
 
 TEST(Localization, EveryLanguageHasEveryKeyWithItsPlaceholders) {
   IcuLocalization strings;
@@ -21,7 +21,7 @@ TEST(Localization, EveryLanguageHasEveryKeyWithItsPlaceholders) {
       EXPECT_NE(text, key) << language << " " << key;
       const bool isNow = key == "LOCATED_NOW" || key == "ACCESSIBILITY_LOCATED_NOW";
       const bool isAge = key.find("LOCATED") != std::string_view::npos;
-      if (isAge) {
+      if (isAge || key == "DISTANCE_AWAY") {
         EXPECT_EQ(text.find("%@") != std::string::npos, !isNow) << language << " " << key << ": " << text;
       }
     }

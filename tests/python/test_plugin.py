@@ -15,7 +15,7 @@ TOKEN = "tok-python-7c1d"
 FRIENDS = {"friends": {"ada@example.com": {
     "location": {"latitude": 45.5152, "longitude": -122.6784, "labels": [{"label": "Work"}]}, "ageSeconds": 300}}}
 ADA = ("BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
-       "EMAIL:ada@example.com\r\nEND:VCARD\r\n")
+       "EMAIL:ada@example.com\r\nPHOTO;ENCODING=b;TYPE=PGM:UDUKMiAxCjI1NQoQ8A==\r\nEND:VCARD\r\n")
 
 
 def write(path, text, mode=0o644):
@@ -61,6 +61,9 @@ class PluginAgainstSim(unittest.TestCase):
         described = self.plugin.describe(reply["kynLocations"][0])
         self.assertEqual(described["name"], "Ada Marlowe")
         self.assertEqual(described["place"], "Work")
+        self.assertTrue(self.plugin.describe(reply["kynLocations"][0], here=(45.5231, -122.6765))["distance"]
+                        .endswith(" away"))
+        self.assertEqual(self.plugin.picture(reply["kynLocations"][0]), (b"P5\n2 1\n255\n\x10\xf0", 2, 1))
         self.assertTrue(any("getlocations" in line for line in log.output), log.output)
         self.assertFalse(any(TOKEN in line for line in log.output))
 

@@ -23,6 +23,7 @@ void PlatformTest::SetUp() {
   s.clock.set(clock);
   s.calendar.set(std::make_shared<platform::IcuCalendar>("UTC"));
   s.numberFormatting.set(std::make_shared<platform::IcuNumberFormatting>("en_US"));
+  s.dateFormatting.set(std::make_shared<platform::IcuDateFormatting>("en_US", "UTC"));
   s.assistantPreferences.set(assistant);
 
   Common::sharedInstance().clearKYNAccount();

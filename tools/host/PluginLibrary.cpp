@@ -27,6 +27,7 @@ PluginLibrary::PluginLibrary(const std::filesystem::path& path) {
   resolve(setLogCallback, "kyn_plugin_set_log_callback");
   resolve(perform, "kyn_plugin_perform");
   resolve(describeLocation, "kyn_plugin_describe_location");
+  resolve(friendPicture, "kyn_plugin_friend_picture");
   resolve(findPeople, "kyn_plugin_find_people");
   resolve(findPerson, "kyn_plugin_find_person");
   resolve(signIn, "kyn_plugin_sign_in");

@@ -34,6 +34,7 @@ class PluginLibrary {
   decltype(&kyn_plugin_set_log_callback) setLogCallback = nullptr;
   decltype(&kyn_plugin_perform) perform = nullptr;
   decltype(&kyn_plugin_describe_location) describeLocation = nullptr;
+  decltype(&kyn_plugin_friend_picture) friendPicture = nullptr;
   decltype(&kyn_plugin_find_people) findPeople = nullptr;
   decltype(&kyn_plugin_find_person) findPerson = nullptr;
   decltype(&kyn_plugin_sign_in) signIn = nullptr;

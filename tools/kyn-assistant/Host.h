@@ -9,6 +9,7 @@
 #include <CLI/CLI.hpp>
 #include <nlohmann/json.hpp>
 
+#include <filesystem>
 #include <optional>
 #include <ostream>
 #include <stdexcept>
@@ -34,6 +35,7 @@ struct Options {
   bool json = false;
   bool verbose = false;
   double timeout = 60.0;
+  std::string picturesDir;  // where friends' pictures are written; empty: nowhere
 };
 
 /// What a command needs while it runs: the loaded, configured plug-in and the host's texts.
@@ -74,5 +76,11 @@ class AssistantCommand : public HostCommand {
 
 /// Prints the reply to `command` for a person, in the assistant's language.
 void printReply(Session& session, const Json& command, const Json& reply, std::ostream& out);
+
+/// Writes the contact picture of every friend of a search reply that has one into `directory`, as
+/// the address book stores it, named after the friend's handle ("ada@example.com.jpg"). Says where
+/// each went on `report` (when given) and what could not be written on `errors`.
+void savePictures(Session& session, const Json& reply, const std::filesystem::path& directory, std::ostream* report,
+                  std::ostream& errors);
 
 }  // namespace kyn::cli

@@ -22,6 +22,9 @@ int AssistantCommand::run(Session& session) {
   const Json parsed = Json::parse(*reply, nullptr, false);
   if (session.options.json) std::cout << parsed.dump(2) << "\n";
   else printReply(session, command, parsed, std::cout);
+  if (!session.options.picturesDir.empty()) {
+    savePictures(session, parsed, session.options.picturesDir, session.options.json ? nullptr : &std::cout, std::cerr);
+  }
   if (parsed.value("class", "") != "AXCommandFailed") return kSuccess;
   if (!session.options.json && !session.options.verbose) std::cerr << session.texts[Text::SeeVerbose] << "\n";
   return kCommandFailed;

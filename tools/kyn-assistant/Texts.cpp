@@ -84,6 +84,8 @@ constexpr Row kTable[] = {
                       "--place-at erwartet BREITE,LÄNGE, nicht „%s“",
                       "--place-at attend LAT,LON, et non « %s »"}},
   {Text::CannotRead, {"cannot read %s", "%s lässt sich nicht lesen", "impossible de lire %s"}},
+  {Text::CannotWrite, {"cannot write %s", "%s lässt sich nicht schreiben", "impossible d’écrire %s"}},
+  {Text::PictureSaved, {"Picture of %s: %s", "Bild von %s: %s", "Photo de %s : %s"}},
   {Text::TokenPrompt, {"Application token: ", "Anwendungstoken: ", "Jeton d’application : "}},
   {Text::SignedIn, {"Signed in as %s on %s.", "Angemeldet als %s bei %s.", "Connecté en tant que %s sur %s."}},
   {Text::BadPersonId, {"The person id \"%s\" is empty, too long or holds control characters; the account is unchanged.",

@@ -35,6 +35,8 @@ enum class Text {
   BadHere,           // %s: the text given
   BadPlaceAt,        // %s: the text given
   CannotRead,        // %s: the file
+  CannotWrite,       // %s: the file
+  PictureSaved,      // %s: the friend's name, %s: the file
   TokenPrompt,
   SignedIn,          // %s: person id, %s: host
   BadPersonId,       // %s: what was given

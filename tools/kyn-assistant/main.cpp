@@ -28,6 +28,9 @@ void defineOptions(CLI::App& app, Options& options) {
   app.add_option("--language", options.language, "The assistant's language, a BCP 47 tag such as en-US, de or fr");
   app.add_flag("--json", options.json, "Print the reply dictionary as JSON instead of text");
   app.add_flag("-v,--verbose", options.verbose, "Show the plug-in's log on standard error");
+  app.add_option("--pictures", options.picturesDir,
+                 "A directory to write each found friend's contact picture into, named after the friend's handle")
+      ->check(CLI::ExistingDirectory);
   app.add_option("--timeout", options.timeout, "Seconds to wait for the reply")
       ->default_val(60.0)
       ->check(CLI::PositiveNumber);

@@ -2,6 +2,8 @@
 
 // A contact of the user's address book, the names of its properties, and the full-name formatter.
 
+#include "platform/image/Image.h"
+
 #include <cstdint>
 #include <memory>
 #include <optional>
@@ -58,8 +60,6 @@ struct LabeledValue {
   std::string value;
   bool operator==(const LabeledValue&) const = default;
 };
-
-using ImageBytes = std::shared_ptr<const std::vector<std::uint8_t>>;
 
 /// A contact: one or more cards of the address book unified by their identifier. Text is UTF-8.
 struct Contact {

@@ -6,7 +6,9 @@
 
 namespace kyn::platform {
 
-std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) {
+namespace {
+
+std::shared_ptr<Image> decode(std::span<const std::uint8_t> data) {
   if (data.empty() || data.size() > static_cast<std::size_t>(INT_MAX)) return nullptr;
   const auto* bytes = reinterpret_cast<const stbi_uc*>(data.data());
   const int length = static_cast<int>(data.size());
@@ -23,6 +25,17 @@ std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) {
   image->pixels.assign(pixels, pixels + static_cast<std::size_t>(width) * static_cast<std::size_t>(height) *
                                             static_cast<std::size_t>(channels));
   stbi_image_free(pixels);
+  return image;
+}
+
+}  // namespace
+
+std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) { return decode(data); }
+
+std::shared_ptr<const Image> imageFromData(const ImageBytes& data) {
+  if (!data) return nullptr;
+  auto image = decode(*data);
+  if (image) image->encoded = data;
   return image;
 }
 

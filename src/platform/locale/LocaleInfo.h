@@ -2,6 +2,7 @@
 
 #include <optional>
 #include <string>
+#include <string_view>
 
 namespace kyn::platform {
 
@@ -26,6 +27,12 @@ class IcuLocaleInfo final : public LocaleInfo {
   std::string id_;
   std::optional<std::string> country_;
 };
+
+/// The ICU locale id for texts in `language` (a BCP 47 tag or an ICU id) with the conventions of the
+/// region of `systemLocaleId`: "de" on an en_US system gives "de_US" (German words, 12-hour clock,
+/// US units). A system locale without a region keeps the language's own; no language gives the
+/// system locale's id.
+[[nodiscard]] std::string presentationLocaleId(const std::optional<std::string>& language, std::string_view systemLocaleId);
 
 /// The lower-case country of the locale, "us" when it names none: where phone numbers without an
 /// international prefix are read.

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "platform/localization/LocalizationDelegate.h"
+
 #include <cstdint>
 #include <memory>
 #include <mutex>
@@ -9,14 +11,19 @@
 
 namespace kyn::platform {
 
-/// The plug-in's own string tables.
-class Localization {
+/// The plug-in's own string tables. As a localisation delegate it serves their one (default) table.
+class Localization : public KYLocalization {
  public:
-  virtual ~Localization() = default;
   /// The text for `key` in `language` (a BCP 47 tag such as "de-CH" or an ICU id such as "de_CH"),
   /// falling back to the parent languages and then to the root (English) table; the key itself when
   /// no table has it. An empty language reads the root table.
   [[nodiscard]] virtual std::string localizedString(std::string_view key, std::string_view language) const = 0;
+
+  [[nodiscard]] std::string localizedStringForKey(std::string_view key, std::string_view /*table*/,
+                                                  std::string_view /*bundle*/,
+                                                  std::string_view languageCode) const final {
+    return localizedString(key, languageCode);
+  }
 };
 
 /// The string tables compiled into the plug-in as ICU resource bundles. The language is given per
