@@ -1,5 +1,7 @@
 #include "platform/Services.h"
 
+#include "platform/contacts/VCardContactStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>

@@ -1,4 +1,4 @@
-#include "platform/prefs/PreferencesStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 #include "support/PlatformTest.h"
 
 #include <sys/wait.h>

@@ -1,5 +1,5 @@
 #include "platform/log/Log.h"
-#include "platform/prefs/PreferencesStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 #include "platform/value/Json.h"
 
 #include <fcntl.h>

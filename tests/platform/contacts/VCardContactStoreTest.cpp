@@ -1,4 +1,4 @@
-#include "platform/contacts/ContactStore.h"
+#include "platform/contacts/VCardContactStore.h"
 #include "support/PlatformTest.h"
 
 #include <algorithm>

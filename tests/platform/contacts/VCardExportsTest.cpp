@@ -1,6 +1,6 @@
 // The reader and the store against address books written by real exporters, read where they stand
 // in the shared test data (never copied into the project).
-#include "platform/contacts/ContactStore.h"
+#include "platform/contacts/VCardContactStore.h"
 #include "platform/contacts/VCard.h"
 #include "platform/image/Image.h"
 #include "platform/text/StringEscapes.h"
