@@ -12,11 +12,12 @@
 
 namespace kyn::platform {
 
-/// One JSON object per domain in `directory`/<domain>.json. A write re-reads the file under a lock
-/// file, applies the pending changes and replaces the file atomically (temporary file, fsync,
-/// rename), so a crash leaves the old or the new content and two processes lose no update. A file
-/// that does not parse reads as empty (logged once) and is replaced by the next write. Domain names
-/// other than [A-Za-z0-9._-] (or starting with a dot) are refused.
+/// One JSON object per domain in `directory`/<domain>.json. A write locks <domain>.json.lock, re-reads
+/// the file, applies the pending changes, writes the result into the lock file itself and renames that
+/// over the domain's file (fsync before and after). So a crash leaves the old or the new content and
+/// nothing but these two files, and two processes lose no update. A file that does not parse reads as
+/// empty (logged once) and is replaced by the next write. Domain names other than [A-Za-z0-9._-] (or
+/// starting with a dot) are refused.
 class FilePreferencesStore final : public PreferencesStore {
  public:
   explicit FilePreferencesStore(std::filesystem::path directory);
