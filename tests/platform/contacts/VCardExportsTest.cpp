@@ -38,17 +38,33 @@ bool contains(const std::vector<std::shared_ptr<const Contact>>& found, const st
   return std::any_of(found.begin(), found.end(), [&](const auto& c) { return c->identifier == identifier; });
 }
 
+// The samples' .vcf files in name order; none when the shared test data is not here.
+std::vector<std::filesystem::path> sampleFiles() {
+  std::vector<std::filesystem::path> files;
+  if (const auto folder = test::sharedTestData("vcards")) {
+    for (const auto& entry : std::filesystem::directory_iterator(*folder)) {
+      if (entry.path().extension() == ".vcf") files.push_back(entry.path());
+    }
+  }
+  std::sort(files.begin(), files.end());
+  return files;
+}
+
+// An ASCII text as UTF-16 with its byte-order mark.
+std::string asciiAsUtf16(std::string_view text, bool bigEndian) {
+  std::string bytes = bigEndian ? "\xFE\xFF" : "\xFF\xFE";
+  for (const char c : text) {
+    bytes += bigEndian ? '\0' : c;
+    bytes += bigEndian ? c : '\0';
+  }
+  return bytes;
+}
+
 using VCardExports = test::PlatformTest;  // keeps the log lines of the loads out of the output
 
 TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
-  const auto folder = test::sharedTestData("vcards");
-  if (!folder) GTEST_SKIP() << "the shared test data (testdata/vcards beside the project) is not here";
-  std::vector<std::filesystem::path> files;
-  for (const auto& entry : std::filesystem::directory_iterator(*folder)) {
-    if (entry.path().extension() == ".vcf") files.push_back(entry.path());
-  }
-  std::sort(files.begin(), files.end());
-  ASSERT_FALSE(files.empty());
+  const auto files = sampleFiles();
+  if (files.empty()) GTEST_SKIP() << "the shared test data (testdata/vcards beside the project) is not here";
 
   std::size_t contacts = 0, named = 0, decodedPhotos = 0;
   for (const auto& file : files) {
@@ -56,6 +72,7 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
     const std::string text = readAll(file);
     const VCardParseResult parsed = parseVCards(text, file.filename().string());
     EXPECT_TRUE(parsed.skipped.empty());
+    EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
     EXPECT_EQ(parsed.contacts.size(), countBeginLines(text));
 
     VCardContactStore store(file, "us");
@@ -105,6 +122,33 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
   EXPECT_GT(contacts, files.size() - 1);
   EXPECT_GT(named, contacts / 2);
   EXPECT_GT(decodedPhotos, 0u);
+}
+
+// The same files with a UTF-8 byte-order mark, and as UTF-16 in either byte order, read alike.
+TEST_F(VCardExports, ByteOrderMarksAndUtf16ChangeNothing) {
+  const auto files = sampleFiles();
+  if (files.empty()) GTEST_SKIP() << "the shared test data (testdata/vcards beside the project) is not here";
+  const auto fields = [](const Contact& c) {
+    return std::tie(c.identifier, c.formattedName, c.givenName, c.familyName, c.organizationName, c.note,
+                    c.emailAddresses, c.phoneNumbers, c.postalAddresses);
+  };
+  for (const auto& file : files) {
+    const std::string text = readAll(file);
+    ASSERT_TRUE(std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; }))
+        << file << " is no longer ASCII: asciiAsUtf16 cannot encode it";
+    const std::string name = file.filename().string();
+    const VCardParseResult plain = parseVCards(text, name);
+    for (const std::string& variant : {"\xEF\xBB\xBF" + text, asciiAsUtf16(text, false), asciiAsUtf16(text, true)}) {
+      SCOPED_TRACE(name + " starting with " + variant.substr(0, 3));
+      const VCardParseResult parsed = parseVCards(variant, name);
+      EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
+      ASSERT_EQ(parsed.contacts.size(), plain.contacts.size());
+      for (std::size_t i = 0; i < plain.contacts.size(); ++i) {
+        EXPECT_TRUE(fields(parsed.contacts[i]) == fields(plain.contacts[i])) << plain.contacts[i].identifier;
+        EXPECT_EQ(bool(parsed.contacts[i].imageData), bool(plain.contacts[i].imageData));
+      }
+    }
+  }
 }
 
 }  // namespace
