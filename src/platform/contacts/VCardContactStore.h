@@ -14,7 +14,8 @@ namespace kyn::platform {
 /// The address book in vCard files (2.1, 3.0 and 4.0): a folder holding .vcf files (one or more
 /// cards each, the layout that CardDAV sync tools write) or a single .vcf file. Loaded on first use
 /// and indexed by e-mail address, phone number and identifier, so that no look-up scans the cards.
-/// A file that cannot be read or a card that does not parse is skipped with one log line.
+/// A file that cannot be read or a card that does not parse is skipped with one log line; whatever
+/// else a file holds that cannot be read is logged in one line for the file.
 class VCardContactStore final : public ContactStore {
  public:
   /// `phoneRegion`: lower-case country code in which numbers without an international prefix are read.
