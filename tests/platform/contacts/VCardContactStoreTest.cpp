@@ -148,6 +148,7 @@ TEST_F(VCardContactStoreTest, LookUpsReturnOnlyTheRequestedKeys) {
   EXPECT_EQ(named->givenName, "Zoe");
   EXPECT_FALSE(named->familyName);
   EXPECT_TRUE(named->emailAddresses.empty());
+  EXPECT_EQ(store.unifiedContactsMatchingEmailAddress("zoe@example.com", kAllKeys, &error).size(), 1u);
   EXPECT_TRUE(error.empty());
 
   const auto formatted = store.unifiedContactsMatchingEmailAddress(

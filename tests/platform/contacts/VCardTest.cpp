@@ -433,15 +433,16 @@ TEST(VCardBadInput, AHundredThousandLineFileIsReadWhole) {
 }
 
 TEST(VCardBadInput, ACardOverTheSizeLimitIsSkippedAndTheNextOneRead) {
-  // The second huge card is cut off: the BEGIN of the next card ends it.
+  // The second huge card is cut off by the BEGIN of the next card, the last one by the end of the text.
   const std::string huge = "BEGIN:VCARD\r\nFN:Huge\r\nPHOTO;ENCODING=b:" + std::string(std::size_t{33} << 20, 'A') + "\r\n";
-  const auto result = parseVCards(huge + "END:VCARD\r\n" + huge + "BEGIN:VCARD\r\nFN:Small\r\nEND:VCARD\r\n",
+  const auto result = parseVCards(huge + "END:VCARD\r\n" + huge + "BEGIN:VCARD\r\nFN:Small\r\nEND:VCARD\r\n" + huge,
                                   "huge.vcf");
   ASSERT_EQ(result.contacts.size(), 1u);
   EXPECT_EQ(result.contacts[0].formattedName, "Small");
   EXPECT_EQ(result.contacts[0].identifier, "huge.vcf#2");
   EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB",
-                                                      "huge.vcf: the card that begins on line 5 is larger than 32 MiB"}));
+                                                      "huge.vcf: the card that begins on line 5 is larger than 32 MiB",
+                                                      "huge.vcf: the card that begins on line 11 is larger than 32 MiB"}));
 }
 
 TEST(VCardBadInput, RandomBytesNeverBreakTheReader) {
