@@ -2,7 +2,7 @@
 // e-mail addresses and identifiers), the phone index that the first phone look-up builds, and one
 // look-up by e-mail address, phone number and identifier with the full key list of the contacts
 // utilities.
-#include "platform/contacts/ContactStore.h"
+#include "platform/contacts/VCardContactStore.h"
 #include "platform/log/Log.h"
 
 #include <benchmark/benchmark.h>

@@ -1,6 +1,6 @@
 // Reads arbitrary bytes as vCard text. Whatever the bytes, charsets and encodings: every contact has
 // an identifier, all of its text is valid UTF-8, a picture is never empty, and every skipped card
-// has its report line.
+// has its report line, as has whatever else was not read.
 #include "platform/contacts/VCard.h"
 #include "platform/text/StringEscapes.h"
 
@@ -48,5 +48,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
     check(!c.thumbnailImageData || !c.thumbnailImageData->empty());
   }
   for (const std::string& line : result.skipped) check(line.starts_with("fuzz.vcf: "));
+  check(result.unread.empty() || (result.unread.starts_with("fuzz.vcf: ") && isValidUtf8(result.unread)));
   return 0;
 }

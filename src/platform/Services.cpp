@@ -1,7 +1,8 @@
 #include "platform/Services.h"
 
+#include "platform/contacts/VCardContactStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
-
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>

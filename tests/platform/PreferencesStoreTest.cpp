@@ -1,10 +1,17 @@
-#include "platform/prefs/PreferencesStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 #include "support/PlatformTest.h"
 
+#include <fcntl.h>
+#include <signal.h>
+#include <spawn.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
+#include <chrono>
+#include <cstdlib>
 #include <fstream>
+#include <random>
+#include <thread>
 
 namespace kyn::platform {
 namespace {
@@ -14,6 +21,13 @@ using test::PlatformTest;
 class PreferencesStoreTest : public PlatformTest {
  protected:
   std::filesystem::path dir() const { return configDir->path() / "prefs"; }
+
+  std::vector<std::string> namesInDir() const {
+    std::vector<std::string> names;
+    for (const auto& e : std::filesystem::directory_iterator(dir())) names.push_back(e.path().filename().string());
+    std::sort(names.begin(), names.end());
+    return names;
+  }
 };
 
 TEST_F(PreferencesStoreTest, ValuesRoundTripAndRemovalDeletesTheKey) {
@@ -101,16 +115,63 @@ TEST_F(PreferencesStoreTest, ACorruptFileReadsAsEmptyAndIsReplacedOnTheNextWrite
 }
 
 TEST_F(PreferencesStoreTest, WritesLeaveNoTemporaryFilesAndKeepTheFilePrivate) {
+  std::filesystem::create_directories(dir());
+  for (const char* name : {"d.json.Ab12Cd", "d.json.notes"}) std::ofstream(dir() / name) << "{}";
   FilePreferencesStore store(dir());
   store.setValue("d", "k", Value("v"));
   ASSERT_TRUE(store.synchronize("d"));
-  std::vector<std::string> names;
-  for (const auto& e : std::filesystem::directory_iterator(dir())) names.push_back(e.path().filename().string());
-  std::sort(names.begin(), names.end());
-  EXPECT_EQ(names, (std::vector<std::string>{"d.json", "d.json.lock"}));
+  // A temporary file that an earlier version left behind goes; other files stay.
+  EXPECT_EQ(namesInDir(), (std::vector<std::string>{"d.json", "d.json.notes"}));
   const auto perms = std::filesystem::status(dir() / "d.json").permissions();
   EXPECT_EQ(perms & (std::filesystem::perms::group_all | std::filesystem::perms::others_all),
             std::filesystem::perms::none);
+}
+
+// A writer in a loop (a separate program) is killed at random moments, mostly in the middle of a
+// write. Each time the file holds the old or the new content, and the folder nothing but the
+// domain's file and its lock file.
+TEST_F(PreferencesStoreTest, AWriterKilledAtAnyMomentLeavesAWholeFileAndNothingElse) {
+  constexpr int kKills = 200;
+  const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(20);
+  std::mt19937 random(std::random_device{}());
+  std::string directory = dir().string();
+  std::string domain = "d";
+  char* argv[] = {const_cast<char*>(KYN_PREFS_WRITER), directory.data(), domain.data(), nullptr};
+  int kills = 0;
+  for (; kills < kKills && std::chrono::steady_clock::now() < deadline; ++kills) {
+    int out[2];
+    ASSERT_EQ(::pipe2(out, O_CLOEXEC), 0);
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_adddup2(&actions, out[1], STDOUT_FILENO);
+    pid_t child = -1;
+    const int spawned = ::posix_spawn(&child, KYN_PREFS_WRITER, &actions, nullptr, argv, environ);
+    posix_spawn_file_actions_destroy(&actions);
+    ::close(out[1]);
+    // The writer reports how long its first write took; the kill comes within such a span.
+    char line[32] = {};
+    const bool writing = spawned == 0 && ::read(out[0], line, sizeof line - 1) > 0;
+    ::close(out[0]);
+    ASSERT_EQ(spawned, 0);
+    std::this_thread::sleep_for(std::chrono::microseconds(random() % (std::atoll(line) + 1)));
+    ::kill(child, SIGKILL);
+    int status = 0;
+    ASSERT_EQ(::waitpid(child, &status, 0), child);
+    ASSERT_TRUE(writing && WIFSIGNALED(status)) << "the writer failed on its own, status " << status;
+
+    const auto names = namesInDir();
+    for (const std::string& name : names) {
+      ASSERT_TRUE(name == "d.json" || name == "d.json.lock") << name << " left after " << kills + 1 << " kills";
+    }
+    FilePreferencesStore reader(dir());
+    const auto stored = reader.value("d", "value");
+    const auto value = stringValue(stored ? &*stored : nullptr);
+    ASSERT_TRUE(value && value->size() > 8 && value->starts_with("written-") &&
+                value->find_first_not_of("0123456789", 8) == std::string::npos)
+        << value.value_or("nothing");
+    ASSERT_EQ(reader.value("d", "padding"), Value(std::string(16384, 'p')));
+  }
+  EXPECT_GE(kills, 30);
 }
 
 TEST_F(PreferencesStoreTest, DomainsThatAreNoFileNamesAreRefused) {

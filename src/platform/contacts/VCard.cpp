@@ -17,16 +17,23 @@
 #include <vector>
 
 // How the reader treats what real exporters write:
+// - The text is UTF-8, with or without a byte-order mark, or UTF-16 in either byte order (told by its
+//   byte-order mark, or by a NUL byte beside the first character when it has none). A UTF-16 text is
+//   read as UTF-8; the CHARSET of a value that is not quoted-printable or base64 then no longer
+//   applies, since the value's characters are known. Unpaired surrogates read as U+FFFD.
 // - Lines end in CRLF, LF or CR, mixed freely. A line that starts with a space or tab continues the
 //   previous one (the break and that one blank are removed). A quoted-printable value that ends in
-//   "=" continues on the next line whatever that line starts with (a soft line break; only a fold
-//   that carries the two hex digits of the escape is read as a fold). A base64 value goes on over
-//   following lines made only of base64 characters until a blank line (2.1).
+//   "=", maybe followed by blanks, continues on the next line whatever that line starts with: a soft
+//   line break, which removes the "=", the blanks after it and the break, and nothing else. A base64
+//   value goes on over following lines made only of base64 characters until a blank line (2.1).
 // - Cards that end without END:VCARD, and cards over 32 MiB, are skipped and reported; text
-//   between cards is ignored. A card without UID is named "<source>#<position>", counted from 0
+//   between cards is ignored (and reported, see below). A card without UID is named "<source>#<position>", counted from 0
 //   over every card of the text, skipped ones included.
 // - A line that reads BEGIN:VCARD or END:VCARD (any case, blanks around it ignored) always opens or
-//   closes a card, even indented: a hand-indented file loses no card that way.
+//   closes a card, even indented: a hand-indented file loses no card that way. A byte-order mark
+//   before it is ignored too (files joined with their marks).
+// - What the reader cannot read besides whole cards (text outside any card, lines in a card that are
+//   no property, bytes that are no UTF-16) is reported once per text, counted, with the first place.
 // - A BEGIN:VCARD right after an empty AGENT property (or "AGENT:BEGIN:VCARD") opens an embedded
 //   card, which is skipped up to its END. Any other BEGIN:VCARD inside a card means the card was cut
 //   off: it is reported and the new card is read.
@@ -130,8 +137,8 @@ std::vector<std::uint8_t> decodeBase64(std::string_view text) {
   return out;
 }
 
-// "=XX" is a byte, "=" before a line break is a soft break; any other "=" stays as it is, except a
-// last one (a soft break with nothing after it).
+// "=XX" is a byte. A "=" with nothing but blanks after it is a soft break with nothing after it
+// (the soft breaks between lines are gone once the lines are joined); any other "=" stays as it is.
 std::string decodeQuotedPrintable(std::string_view text) {
   std::string out;
   out.reserve(text.size());
@@ -144,14 +151,21 @@ std::string decodeQuotedPrintable(std::string_view text) {
     if (i + 2 < text.size() && hexValue(text[i + 1]) >= 0 && hexValue(text[i + 2]) >= 0) {
       out.push_back(static_cast<char>(hexValue(text[i + 1]) * 16 + hexValue(text[i + 2])));
       i += 2;
-    } else if (i + 1 < text.size() && (text[i + 1] == '\r' || text[i + 1] == '\n')) {
-      ++i;
-      if (text[i] == '\r' && i + 1 < text.size() && text[i + 1] == '\n') ++i;
-    } else if (i + 1 < text.size()) {
+    } else if (text.find_first_not_of(" \t", i + 1) == std::string_view::npos) {
+      break;
+    } else {
       out.push_back(c);
     }
   }
   return out;
+}
+
+// A quoted-printable soft line break at the end of `line`: "=" with nothing after it but blanks (which
+// a transport may have added). Where the "=" stands, or nothing.
+std::optional<std::size_t> softBreakAt(std::string_view line) {
+  const std::size_t last = line.find_last_not_of(" \t");
+  if (last == std::string_view::npos || line[last] != '=') return std::nullopt;
+  return last;
 }
 
 // %XX escapes of a URI; a broken escape stays as written.
@@ -558,13 +572,20 @@ void addValue(std::vector<LabeledValue>& list, std::optional<std::string> label,
 // ---------------------------------------------------------------------------------------------
 // A card's logical lines into a contact.
 
-Contact contactOfCard(const std::vector<std::string>& lines, std::string_view sourceName, std::size_t index) {
+// `unicodeText`: the text was read from UTF-16, so values that carry no transfer encoding are text
+// already, whatever their CHARSET says. `unreadLines` counts the lines that are no property.
+Contact contactOfCard(const std::vector<std::string>& lines, std::string_view sourceName, std::size_t index,
+                      bool unicodeText, std::size_t& unreadLines) {
   std::vector<Property> properties;
   properties.reserve(lines.size());
   std::map<std::string, std::string> groupLabels;
   for (const std::string& line : lines) {
     auto property = parseProperty(line);
-    if (!property) continue;  // not a property: ignored
+    if (!property) {
+      ++unreadLines;
+      continue;
+    }
+    if (unicodeText && property->encoding == Encoding::None) property->charset.clear();
     if (property->name == "X-ABLABEL") {
       if (!property->group.empty() && !groupLabels.contains(property->group)) {
         std::string label = cleanLabel(unescape(valueText(*property)));
@@ -718,7 +739,13 @@ class LineReader {
   std::size_t number_ = 0;
 };
 
-bool isMarker(std::string_view line, std::string_view marker) { return equalsIgnoringCase(trim(line), marker); }
+constexpr std::string_view kUtf8ByteOrderMark = "\xEF\xBB\xBF";
+
+bool isMarker(std::string_view line, std::string_view marker) {
+  line = trim(line);
+  if (line.starts_with(kUtf8ByteOrderMark)) line = trim(line.substr(kUtf8ByteOrderMark.size()));
+  return equalsIgnoringCase(line, marker);
+}
 
 // A property line that opens an embedded card: "AGENT:" with nothing after it, or "AGENT:BEGIN:VCARD".
 enum class AgentLine { No, Opens, OpensOnThisLine };
@@ -746,8 +773,8 @@ class LogicalLines {
     }
     const bool continuation = isBlank(line.front());
     if (open_) {
-      if (current_.back() == '=' && encoding() == Encoding::QuotedPrintable && !(continuation && foldsEscape(line))) {
-        current_.pop_back();  // soft line break
+      if (const auto softBreak = softBreakAt(current_); softBreak && encoding() == Encoding::QuotedPrintable) {
+        current_.resize(*softBreak);
         current_.append(line);
         return;
       }
@@ -788,12 +815,6 @@ class LogicalLines {
   }
 
  private:
-  // "=" at the end of a line, then a fold that carries the escape's two hex digits: a fold inside
-  // a quoted-printable escape rather than a soft break.
-  static bool foldsEscape(std::string_view line) {
-    return line.size() >= 3 && hexValue(line[1]) >= 0 && hexValue(line[2]) >= 0;
-  }
-
   // The transfer encoding of the open line, read once its head is complete.
   Encoding encoding() {
     if (encoding_) return *encoding_;
@@ -814,14 +835,20 @@ class LogicalLines {
 
 class CardReader {
  public:
-  CardReader(std::string_view text, std::string_view sourceName) : reader_(text), source_(sourceName) {}
+  // `invalidUnits`: how many code units of a UTF-16 text were no character.
+  CardReader(std::string_view text, std::string_view sourceName, bool unicodeText, std::size_t invalidUnits)
+      : reader_(text), source_(sourceName), unicodeText_(unicodeText), invalidUnits_(invalidUnits) {}
 
   VCardParseResult run() {
     std::string_view line;
     while (reader_.next(line)) {
       switch (state_) {
         case State::Outside:
-          if (isMarker(line, "BEGIN:VCARD")) begin();
+          if (isMarker(line, "BEGIN:VCARD")) {
+            begin();
+          } else if (!trim(line).empty()) {
+            if (outsideLines_++ == 0) firstOutsideLine_ = reader_.number();
+          }
           break;
         case State::InCard:
           inCard(line);
@@ -849,6 +876,14 @@ class CardReader {
     } else if (state_ != State::Outside) {
       skip("has no END:VCARD");
     }
+    if (outsideLines_ > 0) {
+      unread(counted(outsideLines_, "line") + " outside any card, the first on line " + std::to_string(firstOutsideLine_));
+    }
+    if (propertylessLines_ > 0) {
+      unread(counted(propertylessLines_, "line") + " in cards that are no property, the first in the card that begins on line " +
+             std::to_string(firstPropertylessCard_));
+    }
+    if (invalidUnits_ > 0) unread(counted(invalidUnits_, "UTF-16 code unit") + " that are no character, read as U+FFFD");
     return std::move(result_);
   }
 
@@ -877,7 +912,10 @@ class CardReader {
     if (isMarker(line, "END:VCARD")) {
       lines_.finish();
       try {
-        result_.contacts.push_back(contactOfCard(lines_.lines(), source_, cardIndex_));
+        std::size_t unreadLines = 0;
+        result_.contacts.push_back(contactOfCard(lines_.lines(), source_, cardIndex_, unicodeText_, unreadLines));
+        if (unreadLines > 0 && propertylessLines_ == 0) firstPropertylessCard_ = cardLine_;
+        propertylessLines_ += unreadLines;
       } catch (const std::exception&) {
         skip("could not be read");  // out of memory: the card is lost, the rest is read
       }
@@ -909,6 +947,16 @@ class CardReader {
     lines_.add(line);
   }
 
+  static std::string counted(std::size_t count, std::string_view noun) {
+    return std::to_string(count) + " " + std::string(noun) + (count == 1 ? "" : "s");
+  }
+
+  // Adds a reason to the one line that tells what else could not be read.
+  void unread(const std::string& reason) {
+    result_.unread += result_.unread.empty() ? std::string(source_) + ": not read: " : std::string("; ");
+    result_.unread += reason;
+  }
+
   void skip(std::string_view reason) {
     result_.skipped.push_back(std::string(source_) + ": the card that begins on line " + std::to_string(cardLine_) +
                               " " + std::string(reason));
@@ -916,6 +964,8 @@ class CardReader {
 
   LineReader reader_;
   std::string_view source_;
+  bool unicodeText_;
+  std::size_t invalidUnits_;
   VCardParseResult result_;
   LogicalLines lines_;
   State state_ = State::Outside;
@@ -925,13 +975,85 @@ class CardReader {
   std::size_t cardCount_ = 0;
   int depth_ = 0;
   bool previousOpensAgent_ = false;
+  std::size_t outsideLines_ = 0;
+  std::size_t firstOutsideLine_ = 0;
+  std::size_t propertylessLines_ = 0;
+  std::size_t firstPropertylessCard_ = 0;
 };
+
+// UTF-16 text as UTF-8; an unpaired surrogate or a last odd byte becomes U+FFFD and is counted.
+std::string utf8FromUtf16(std::string_view bytes, bool bigEndian, std::size_t& invalid) {
+  const auto unit = [&](std::size_t i) -> char32_t {
+    const auto first = static_cast<unsigned char>(bytes[2 * i]);
+    const auto second = static_cast<unsigned char>(bytes[2 * i + 1]);
+    return bigEndian ? (char32_t{first} << 8) | second : (char32_t{second} << 8) | first;
+  };
+  const auto append = [](std::string& out, char32_t c) {
+    if (c < 0x80) {
+      out.push_back(static_cast<char>(c));
+    } else if (c < 0x800) {
+      out.push_back(static_cast<char>(0xC0 | (c >> 6)));
+      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
+    } else if (c < 0x10000) {
+      out.push_back(static_cast<char>(0xE0 | (c >> 12)));
+      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
+      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
+    } else {
+      out.push_back(static_cast<char>(0xF0 | (c >> 18)));
+      out.push_back(static_cast<char>(0x80 | ((c >> 12) & 0x3F)));
+      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
+      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
+    }
+  };
+  const std::size_t units = bytes.size() / 2;
+  std::string out;
+  out.reserve(units + units / 2);
+  for (std::size_t i = 0; i < units; ++i) {
+    char32_t c = unit(i);
+    if (c >= 0xD800 && c <= 0xDBFF && i + 1 < units && unit(i + 1) >= 0xDC00 && unit(i + 1) <= 0xDFFF) {
+      c = 0x10000 + ((c - 0xD800) << 10) + (unit(++i) - 0xDC00);
+    } else if (c >= 0xD800 && c <= 0xDFFF) {
+      c = 0xFFFD;
+      ++invalid;
+    }
+    append(out, c);
+  }
+  if (bytes.size() % 2 != 0) {
+    append(out, 0xFFFD);
+    ++invalid;
+  }
+  return out;
+}
+
+enum class TextEncoding { Utf8, Utf16LittleEndian, Utf16BigEndian };
+
+// The encoding of a text by its byte-order mark, which is then dropped from `text`. Without one,
+// UTF-16 shows in a NUL byte beside the first character (a vCard starts with ASCII).
+TextEncoding textEncoding(std::string_view& text) {
+  if (text.starts_with(kUtf8ByteOrderMark)) {
+    text.remove_prefix(kUtf8ByteOrderMark.size());
+    return TextEncoding::Utf8;
+  }
+  if (text.starts_with("\xFF\xFE") || text.starts_with("\xFE\xFF")) {
+    const bool bigEndian = text[0] == '\xFE';
+    text.remove_prefix(2);
+    return bigEndian ? TextEncoding::Utf16BigEndian : TextEncoding::Utf16LittleEndian;
+  }
+  if (text.size() >= 2 && (text[0] == '\0') != (text[1] == '\0')) {
+    return text[0] == '\0' ? TextEncoding::Utf16BigEndian : TextEncoding::Utf16LittleEndian;
+  }
+  return TextEncoding::Utf8;
+}
 
 }  // namespace
 
 VCardParseResult parseVCards(std::string_view text, std::string_view sourceName) {
   try {
-    return CardReader(text, sourceName).run();
+    const TextEncoding encoding = textEncoding(text);
+    if (encoding == TextEncoding::Utf8) return CardReader(text, sourceName, false, 0).run();
+    std::size_t invalid = 0;
+    const std::string utf8 = utf8FromUtf16(text, encoding == TextEncoding::Utf16BigEndian, invalid);
+    return CardReader(utf8, sourceName, true, invalid).run();
   } catch (const std::exception&) {
     VCardParseResult result;
     result.skipped.push_back(std::string(sourceName) + ": could not be read (out of memory)");

@@ -1,4 +1,4 @@
-#include "platform/contacts/ContactStore.h"
+#include "platform/contacts/VCardContactStore.h"
 #include "platform/Services.h"
 
 #include "platform/contacts/VCard.h"
@@ -254,6 +254,7 @@ struct VCardContactStore::Impl {
         ++fileCount;
         VCardParseResult parsed = parseVCards(*text, sourceName);
         for (const std::string& line : parsed.skipped) Log::shared().error("Contacts: skipped a card: %@", line);
+        if (!parsed.unread.empty()) Log::shared().error("Contacts: %@", parsed.unread);
         for (Contact& contact : parsed.contacts) {
           const auto [it, added] = positionOfIdentifier.try_emplace(contact.identifier, book.size());
           if (added) {

@@ -1,12 +1,14 @@
 #include "platform/log/Log.h"
-#include "platform/prefs/PreferencesStore.h"
+#include "platform/prefs/FilePreferencesStore.h"
 #include "platform/value/Json.h"
 
+#include <dirent.h>
 #include <fcntl.h>
 #include <sys/file.h>
 #include <sys/stat.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <string>
@@ -60,6 +62,50 @@ std::optional<std::string> readAll(const std::filesystem::path& file) {
     if (text.size() > kMaxFileBytes) return std::nullopt;
   }
   return text;
+}
+
+// Opens and locks the domain's lock file `name` in `dir`. A writer renames the lock file it holds
+// over the domain's file, so a lock won on a file that no longer bears the name is worthless: then
+// the file now named so (created anew when there is none) is taken instead. -1 with errno on failure.
+int lockStagingFile(int dir, const std::string& name) {
+  for (;;) {
+    Fd fd(::openat(dir, name.c_str(), O_RDWR | O_CREAT | O_CLOEXEC | O_NOFOLLOW, 0600));
+    if (fd.get() < 0) return -1;
+    while (::flock(fd.get(), LOCK_EX) != 0) {
+      if (errno != EINTR) return -1;
+    }
+    struct stat held {};
+    struct stat named {};
+    if (::fstat(fd.get(), &held) != 0) return -1;
+    if (::fstatat(dir, name.c_str(), &named, AT_SYMLINK_NOFOLLOW) != 0) {
+      if (errno == ENOENT) continue;
+      return -1;
+    }
+    if (named.st_dev == held.st_dev && named.st_ino == held.st_ino) return fd.release();
+  }
+}
+
+// Earlier versions wrote through temporary files named "<file>.XXXXXX" (six letters or digits), which
+// a crash left behind for good. Called under the lock, so no write of ours is using one.
+void removeStaleTemporaries(int dir, const std::string& fileName) {
+  const int listFd = ::dup(dir);
+  if (listFd < 0) return;
+  DIR* listing = ::fdopendir(listFd);
+  if (listing == nullptr) {
+    ::close(listFd);
+    return;
+  }
+  const std::string prefix = fileName + ".";
+  while (const dirent* entry = ::readdir(listing)) {
+    const std::string_view name(entry->d_name);
+    if (name.size() != prefix.size() + 6 || !name.starts_with(prefix)) continue;
+    const std::string_view suffix = name.substr(prefix.size());
+    const bool temporary = std::all_of(suffix.begin(), suffix.end(), [](char c) {
+      return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9');
+    });
+    if (temporary) ::unlinkat(dir, entry->d_name, 0);
+  }
+  ::closedir(listing);
 }
 
 }  // namespace
@@ -141,14 +187,16 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
   std::error_code ec;
   std::filesystem::create_directories(directory_, ec);
   if (ec) return fail("create directory");
+  Fd dir(::open(directory_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
+  if (dir.get() < 0) return fail("open directory");
 
-  // Serialise writers of all processes, then merge our changes into what is on disk now.
-  const std::string lockPath = file.string() + ".lock";
-  Fd lockFd(::open(lockPath.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600));
-  if (lockFd.get() < 0) return fail("open lock");
-  while (::flock(lockFd.get(), LOCK_EX) != 0) {
-    if (errno != EINTR) return fail("lock");
-  }
+  // Serialise the writers of all processes on the lock file, then merge our changes into what is
+  // on disk now.
+  const std::string fileName = file.filename().string();
+  const std::string lockName = fileName + ".lock";
+  Fd staging(lockStagingFile(dir.get(), lockName));
+  if (staging.get() < 0) return fail("lock");
+  removeStaleTemporaries(dir.get(), fileName);
 
   Value current = stampOf(file).exists ? readFile(file, false) : Value::object();
   for (auto& [key, value] : domain.pending) {
@@ -157,20 +205,16 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
   }
   const std::string text = toJson(current, 2) + "\n";
 
-  std::string tmpPath = file.string() + ".XXXXXX";
-  Fd tmp(::mkstemp(tmpPath.data()));
-  if (tmp.get() < 0) return fail("create temporary file");
-  const bool written = writeAll(tmp.get(), text) && ::fsync(tmp.get()) == 0;
-  if (!written || ::close(tmp.release()) != 0) {
-    ::unlink(tmpPath.c_str());
+  // The new content goes into the lock file itself, which then replaces the domain's file. So the
+  // folder never holds more than these two files, whatever happens to the process, and a crash
+  // before the rename leaves the old content (and a lock file with a partial copy, which the next
+  // writer overwrites).
+  if (::ftruncate(staging.get(), 0) != 0 || ::fchmod(staging.get(), 0600) != 0 || !writeAll(staging.get(), text) ||
+      ::fsync(staging.get()) != 0) {
     return fail("write");
   }
-  if (::rename(tmpPath.c_str(), file.c_str()) != 0) {
-    ::unlink(tmpPath.c_str());
-    return fail("rename");
-  }
-  Fd dir(::open(directory_.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC));
-  if (dir.get() >= 0) ::fsync(dir.get());
+  if (::renameat(dir.get(), lockName.c_str(), dir.get(), fileName.c_str()) != 0) return fail("rename");
+  ::fsync(dir.get());
 
   domain.pending.clear();
   domain.content = std::move(current);

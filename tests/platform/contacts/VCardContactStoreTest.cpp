@@ -1,4 +1,4 @@
-#include "platform/contacts/ContactStore.h"
+#include "platform/contacts/VCardContactStore.h"
 #include "support/PlatformTest.h"
 
 #include <algorithm>
@@ -148,6 +148,7 @@ TEST_F(VCardContactStoreTest, LookUpsReturnOnlyTheRequestedKeys) {
   EXPECT_EQ(named->givenName, "Zoe");
   EXPECT_FALSE(named->familyName);
   EXPECT_TRUE(named->emailAddresses.empty());
+  EXPECT_EQ(store.unifiedContactsMatchingEmailAddress("zoe@example.com", kAllKeys, &error).size(), 1u);
   EXPECT_TRUE(error.empty());
 
   const auto formatted = store.unifiedContactsMatchingEmailAddress(
@@ -166,16 +167,18 @@ TEST_F(VCardContactStoreTest, LookUpsReturnOnlyTheRequestedKeys) {
 
 TEST_F(VCardContactStoreTest, BadFilesAndCardsAreLoggedOnceAndTheRestStillWorks) {
   book.write("good.vcf", card("UID:g\r\nEMAIL:good@example.com\r\n") + "BEGIN:VCARD\r\nFN:Secret Name\r\n");
+  book.write("junk.vcf", "Secret junk\r\n" + card("no property, Secret\r\n") + "more junk\r\n");
   const auto big = book.write("big.vcf", "");
   std::filesystem::resize_file(big, (std::uint64_t{64} << 20) + 1);  // sparse: costs no disk
   std::filesystem::create_symlink(book.path() / "gone", book.path() / "dangling.vcf");
   VCardContactStore store(book.path(), "us");
-  EXPECT_EQ(store.load(), 1u);
+  EXPECT_EQ(store.load(), 2u);
   EXPECT_EQ(identifiersOf(byEmail(store, "good@example.com")), (std::vector<std::string>{"g"}));
-  EXPECT_EQ(store.load(), 1u);  // loads once
+  EXPECT_EQ(store.load(), 2u);  // loads once
 
   const auto errors = log->messages(LogLevel::Error);
-  ASSERT_EQ(errors.size(), 3u);
+  ASSERT_EQ(errors.size(), 4u);
+  EXPECT_EQ(logLinesContaining("junk.vcf"), 1u);  // what it could not read, once for the file
   EXPECT_EQ(logLinesContaining("big.vcf: larger than 64 MiB"), 1u);
   EXPECT_EQ(logLinesContaining("dangling.vcf: No such file or directory"), 1u);
   EXPECT_EQ(logLinesContaining("good.vcf: the card that begins on line 6 has no END:VCARD"), 1u);

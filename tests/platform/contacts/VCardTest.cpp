@@ -83,19 +83,66 @@ TEST(VCardLines, BeginAndEndIgnoreCaseAndJunkBetweenCardsIsIgnored) {
   EXPECT_EQ(result.contacts[0].formattedName, "One");
   EXPECT_EQ(result.contacts[1].formattedName, "Two");
   EXPECT_TRUE(result.skipped.empty());
+  EXPECT_NE(result.unread.find("line 1"), std::string::npos) << result.unread;  // ignored, yet reported
 }
 
 TEST(VCardLines, EmptyAndJunkTextsHoldNoCards) {
-  for (std::string_view text : {std::string_view(""), std::string_view("\r\n\r\n"), std::string_view("END:VCARD\r\n"),
+  for (std::string_view text : {std::string_view(""), std::string_view("\r\n \r\n"), std::string_view("END:VCARD\r\n"),
                                  std::string_view("hello\0world", 11)}) {
     const auto result = parseVCards(text, "x.vcf");
     EXPECT_TRUE(result.contacts.empty());
     EXPECT_TRUE(result.skipped.empty());
+    EXPECT_EQ(result.unread.empty(), text.find_first_not_of("\r\n ") == std::string_view::npos) << result.unread;
   }
-  // A card with nothing in it is still a card.
+  // A card with nothing in it is still a card; a line in it that is no property is reported.
   const auto empty = parseVCards("BEGIN:VCARD\r\nEND:VCARD\r\n", "x.vcf");
   ASSERT_EQ(empty.contacts.size(), 1u);
   EXPECT_EQ(empty.contacts[0].identifier, "x.vcf#0");
+  EXPECT_TRUE(empty.unread.empty());
+  const auto junk = parseVCards(card("FN:A\r\n") + card("FN:B\r\nno property here\r\n"), "x.vcf");
+  EXPECT_EQ(junk.contacts.size(), 2u);
+  EXPECT_NE(junk.unread.find("line 5"), std::string::npos) << junk.unread;
+}
+
+// UTF-16 bytes of `text` in the given order.
+std::string utf16Bytes(std::u16string_view text, bool bigEndian) {
+  std::string bytes;
+  for (const char16_t unit : text) {
+    const char high = static_cast<char>(unit >> 8), low = static_cast<char>(unit & 0xFF);
+    bytes += bigEndian ? high : low;
+    bytes += bigEndian ? low : high;
+  }
+  return bytes;
+}
+
+TEST(VCardLines, Utf16InEitherOrderAndUtf8WithByteOrderMarks) {
+  // The CHARSET of a plain value no longer applies once the text is UTF-16; a quoted-printable one's does.
+  const std::u16string text =
+      u"\uFEFFBEGIN:VCARD\r\nFN;CHARSET=ISO-8859-1:Zo\u00EB \U0001F600\r\n"
+      u"N;ENCODING=QUOTED-PRINTABLE;CHARSET=ISO-8859-1:M=FCller\r\nEND:VCARD\r\n";
+  for (const bool bigEndian : {false, true}) {
+    for (const bool mark : {true, false}) {
+      SCOPED_TRACE(std::string(bigEndian ? "big" : "little") + (mark ? " endian with mark" : " endian without"));
+      const auto result = parseVCards(utf16Bytes(mark ? text : text.substr(1), bigEndian), "x.vcf");
+      ASSERT_EQ(result.contacts.size(), 1u);
+      EXPECT_EQ(result.contacts[0].formattedName, "Zo\xC3\xAB \xF0\x9F\x98\x80");
+      EXPECT_EQ(result.contacts[0].familyName, "M\xC3\xBCller");
+      EXPECT_TRUE(result.unread.empty()) << result.unread;
+    }
+  }
+
+  // Unpaired surrogates, a high one last, and an odd last byte: each a U+FFFD, and reported.
+  const std::u16string broken = u"BEGIN:VCARD\r\nFN:a\xD800" u"b\xDC00\r\nEND:VCARD\r\n\xD83D";
+  const auto result = parseVCards("\xFF\xFE" + utf16Bytes(broken, false) + "!", "x.vcf");
+  ASSERT_EQ(result.contacts.size(), 1u);
+  EXPECT_EQ(result.contacts[0].formattedName, "a\xEF\xBF\xBD" "b\xEF\xBF\xBD");
+  EXPECT_FALSE(result.unread.empty());
+
+  // UTF-8 with its mark, twice: files joined as they were exported.
+  const std::string utf8 = "\xEF\xBB\xBF" + card("FN:One\r\n");
+  const auto joined = parseVCards(utf8 + utf8, "x.vcf");
+  EXPECT_EQ(joined.contacts.size(), 2u);
+  EXPECT_TRUE(joined.unread.empty()) << joined.unread;
 }
 
 TEST(VCardLines, CutOffCardsAreReportedAndTheCardsAroundThemRead) {
@@ -277,16 +324,17 @@ TEST(VCardEncodings, QuotedPrintableWithSoftBreaksAndFolds) {
       "=0D=0Athird\r\n"
       "FN;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:Ren=C3=\r\n"  // a soft break inside a character
       "=A9e=20Dupont\r\n"
-      "N;QUOTED-PRINTABLE;CHARSET=UTF-8:M=C3=BC=\r\n"  // a fold inside an escape (bare encoding)
-      " 6Cler;Jos=C3=A9\r\n"
-      "TITLE;ENCODING=QUOTED-PRINTABLE:Ends with soft break=\r\n"
+      "N;QUOTED-PRINTABLE;CHARSET=UTF-8:De=\r\n"  // bare encoding; the blank after a soft break is text,
+      " Abbott;Mary=\t \r\n"                     // even before two hex digits; blanks after "=" are not
+      "Ann\r\n"
+      "TITLE;ENCODING=QUOTED-PRINTABLE:Ends with soft break= \r\n"
       "\r\n"
       "ORG;ENCODING=QUOTED-PRINTABLE:Bad =ZZ escape=4\r\n",
       "2.1"));
   EXPECT_EQ(c.note, "Line one\nLine two = done\nthird");
   EXPECT_EQ(c.formattedName, "Ren\xC3\xA9" "e Dupont");
-  EXPECT_EQ(c.familyName, "M\xC3\xBCller");
-  EXPECT_EQ(c.givenName, "Jos\xC3\xA9");
+  EXPECT_EQ(c.familyName, "De Abbott");
+  EXPECT_EQ(c.givenName, "MaryAnn");
   EXPECT_EQ(c.jobTitle, "Ends with soft break");
   EXPECT_EQ(c.organizationName, "Bad =ZZ escape=4");  // broken escapes stay as written
 }
@@ -385,14 +433,16 @@ TEST(VCardBadInput, AHundredThousandLineFileIsReadWhole) {
 }
 
 TEST(VCardBadInput, ACardOverTheSizeLimitIsSkippedAndTheNextOneRead) {
-  const std::string filler(std::size_t{33} << 20, 'A');
-  const auto result = parseVCards("BEGIN:VCARD\r\nFN:Huge\r\nPHOTO;ENCODING=b:" + filler +
-                                      "\r\nEND:VCARD\r\nBEGIN:VCARD\r\nFN:Small\r\nEND:VCARD\r\n",
+  // The second huge card is cut off by the BEGIN of the next card, the last one by the end of the text.
+  const std::string huge = "BEGIN:VCARD\r\nFN:Huge\r\nPHOTO;ENCODING=b:" + std::string(std::size_t{33} << 20, 'A') + "\r\n";
+  const auto result = parseVCards(huge + "END:VCARD\r\n" + huge + "BEGIN:VCARD\r\nFN:Small\r\nEND:VCARD\r\n" + huge,
                                   "huge.vcf");
   ASSERT_EQ(result.contacts.size(), 1u);
   EXPECT_EQ(result.contacts[0].formattedName, "Small");
-  EXPECT_EQ(result.contacts[0].identifier, "huge.vcf#1");
-  EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB"}));
+  EXPECT_EQ(result.contacts[0].identifier, "huge.vcf#2");
+  EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB",
+                                                      "huge.vcf: the card that begins on line 5 is larger than 32 MiB",
+                                                      "huge.vcf: the card that begins on line 11 is larger than 32 MiB"}));
 }
 
 TEST(VCardBadInput, RandomBytesNeverBreakTheReader) {
