@@ -3,6 +3,10 @@
 #include "platform/contacts/VCardContactStore.h"
 #include "platform/prefs/FilePreferencesStore.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
+#include "platform/time/SystemTime.h"
+#include "platform/time/IcuDateFormatting.h"
+#include "platform/localization/IcuLocalization.h"
+#include "platform/locale/IcuLocaleInfo.h"
 
 #include <unicode/locid.h>
 #include <unicode/uloc.h>

@@ -1,5 +1,6 @@
 #include "account/Common.h"
 #include "support/ContactsTest.h"
+#include "platform/locale/IcuLocaleInfo.h"
 
 namespace kyn {
 namespace {

@@ -1,6 +1,7 @@
 #include "model/KYNAXLocation.h"
 #include "platform/value/Json.h"
 #include "support/ContactsTest.h"
+#include "platform/localization/IcuLocalization.h"
 
 namespace kyn {
 namespace {

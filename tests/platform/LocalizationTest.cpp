@@ -1,5 +1,6 @@
 #include "platform/localization/Localization.h"
 #include "platform/log/Format.h"
+#include "platform/localization/IcuLocalization.h"
 
 #include <gtest/gtest.h>
 

@@ -1,5 +1,6 @@
 #include "platform/Services.h"
 #include "support/PlatformTest.h"
+#include "platform/locale/IcuLocaleInfo.h"
 
 #include <nlohmann/json.hpp>
 

@@ -2,6 +2,7 @@
 
 #include "support/FakeContactStore.h"
 #include "support/PlatformTest.h"
+#include "platform/locale/IcuLocaleInfo.h"
 
 namespace kyn::test {
 

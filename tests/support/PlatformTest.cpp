@@ -1,6 +1,9 @@
 #include "support/PlatformTest.h"
 
 #include "account/Common.h"
+#include "platform/time/SystemTime.h"
+#include "platform/time/IcuDateFormatting.h"
+#include "platform/localization/IcuLocalization.h"
 
 namespace kyn::test {
 

@@ -1,5 +1,7 @@
 #include "support/PlatformTest.h"
 #include "utils/KYNAXUtils.h"
+#include "platform/time/SystemTime.h"
+#include "platform/localization/IcuLocalization.h"
 
 #include <cmath>
 

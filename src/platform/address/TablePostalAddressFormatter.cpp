@@ -1,6 +1,6 @@
 #include "platform/address/PostalAddress.h"
 
-#include "platform/localization/Localization.h"
+#include "platform/localization/IcuLocalization.h"
 
 #include <unicode/locid.h>
 #include <unicode/uchar.h>

@@ -1,6 +1,8 @@
 #include "platform/locale/LocaleInfo.h"
 
 #include "platform/localization/Localization.h"
+#include "platform/locale/IcuLocaleInfo.h"
+#include "platform/localization/IcuLocalization.h"
 
 #include <unicode/locid.h>
 

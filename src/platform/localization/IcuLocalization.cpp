@@ -1,4 +1,5 @@
 #include "platform/localization/Localization.h"
+#include "platform/localization/IcuLocalization.h"
 
 #include <unicode/decimfmt.h>
 #include <unicode/numfmt.h>

@@ -26,17 +26,6 @@ class Localization : public KYLocalization {
   }
 };
 
-/// The string tables compiled into the plug-in as ICU resource bundles. The language is given per
-/// call; the process's default locale plays no part in the fallback.
-class IcuLocalization final : public Localization {
- public:
-  IcuLocalization();
-  std::string localizedString(std::string_view key, std::string_view language) const override;
-};
-
-/// Turns a language code ("en-US", "de_CH", "fr") into an ICU locale id ("en_US", "de_CH", "fr").
-[[nodiscard]] std::string icuLocaleId(std::string_view language);
-
 /// Number texts in a locale.
 class NumberFormatting {
  public:
@@ -46,19 +35,6 @@ class NumberFormatting {
   /// Reads a decimal number written as the locale writes it ("1,234.5" in English, "1.234,5" in
   /// German). Nothing unless the whole text is one number.
   [[nodiscard]] virtual std::optional<double> parseDecimal(std::string_view text) const = 0;
-};
-
-/// ICU number formats for one locale (the process's default locale unless one is named), built once.
-class IcuNumberFormatting final : public NumberFormatting {
- public:
-  explicit IcuNumberFormatting(std::optional<std::string> localeId = std::nullopt);
-  ~IcuNumberFormatting() override;
-  std::string integerText(std::uint64_t value) const override;
-  std::optional<double> parseDecimal(std::string_view text) const override;
-
- private:
-  struct Impl;
-  std::unique_ptr<Impl> impl_;
 };
 
 }  // namespace kyn::platform

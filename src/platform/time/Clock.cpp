@@ -1,4 +1,5 @@
 #include "platform/time/Clock.h"
+#include "platform/time/SystemTime.h"
 
 #include <unicode/calendar.h>
 #include <unicode/timezone.h>

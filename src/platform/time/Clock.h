@@ -19,11 +19,6 @@ class Clock {
   [[nodiscard]] virtual Date now() const = 0;
 };
 
-class SystemClock final : public Clock {
- public:
-  [[nodiscard]] Date now() const override;
-};
-
 struct HourMinuteSecond {
   int hour = 0;
   int minute = 0;
@@ -38,19 +33,6 @@ class Calendar {
   [[nodiscard]] virtual HourMinuteSecond hourMinuteSecond(Date date) const = 0;
   /// `date` moved by the given calendar components (hours, then minutes, then seconds).
   [[nodiscard]] virtual Date adding(Date date, int hours, int minutes, int seconds) const = 0;
-};
-
-/// ICU's calendar for the default locale, in the process's time zone or in the one named.
-class IcuCalendar final : public Calendar {
- public:
-  explicit IcuCalendar(std::optional<std::string> timeZoneId = std::nullopt);
-  ~IcuCalendar() override;
-  HourMinuteSecond hourMinuteSecond(Date date) const override;
-  Date adding(Date date, int hours, int minutes, int seconds) const override;
-
- private:
-  struct Impl;
-  std::unique_ptr<Impl> impl_;
 };
 
 }  // namespace kyn::platform

@@ -1,4 +1,5 @@
 #include "platform/time/DateFormatting.h"
+#include "platform/time/IcuDateFormatting.h"
 
 #include <unicode/datefmt.h>
 #include <unicode/timezone.h>

@@ -1,5 +1,6 @@
 #include "platform/contacts/VCardContactStore.h"
 #include "support/PlatformTest.h"
+#include "platform/locale/IcuLocaleInfo.h"
 
 #include <algorithm>
 #include <atomic>
