@@ -2,6 +2,7 @@
 // e-mail addresses and identifiers), the phone index that the first phone look-up builds, and one
 // look-up by e-mail address, phone number and identifier with the full key list of the contacts
 // utilities.
+#include "host/Process.h"
 #include "platform/contacts/VCardContactStore.h"
 #include "platform/log/Log.h"
 
@@ -53,9 +54,7 @@ class Book {
  public:
   Book() {
     Log::shared().setMinimumLevel(LogLevel::Error);
-    std::string templ = (std::filesystem::temp_directory_path() / "kyn-bench-XXXXXX").string();
-    if (::mkdtemp(templ.data()) == nullptr) std::abort();
-    root_ = templ;
+    root_ = dir_.path();
     std::filesystem::create_directories(root_ / "folder");
     std::ofstream single(root_ / "single.vcf", std::ios::binary);
     for (int i = 0; i < kCards; ++i) {
@@ -64,14 +63,11 @@ class Book {
       single << card;
     }
   }
-  ~Book() {
-    std::error_code ec;
-    std::filesystem::remove_all(root_, ec);
-  }
   [[nodiscard]] std::filesystem::path folder() const { return root_ / "folder"; }
   [[nodiscard]] std::filesystem::path single() const { return root_ / "single.vcf"; }
 
  private:
+  kyn::host::TempDir dir_{"kyn-bench"};
   std::filesystem::path root_;
 };
 

@@ -3,7 +3,7 @@
 #include "sim/GetLocations.h"
 #include "sim/RequestLog.h"
 #include "sim/Router.h"
-#include "TempDir.h"
+#include "host/Process.h"
 
 #include <gtest/gtest.h>
 
@@ -193,8 +193,8 @@ TEST(RouterTest, EachFaultKind) {
     EXPECT_FALSE(Json::accept(out.reply.body));
   }
 
-  test::TempDir dir;
-  const auto path = dir / "hostile.json";
+  host::TempDir dir;
+  const auto path = dir.path() / "hostile.json";
   auto router = makeRouter(faulty("body:" + path.string()));
   const std::string bytes("{\"statusCode\":\"200\",\"locations\":[\0]}", 35);
   writeFileAtomically(path, bytes);

@@ -1,7 +1,7 @@
 // The program itself. What it answers over HTTPS is covered by the end-to-end tests of the plug-in.
 #include "sim/Files.h"
 #include "sim/Router.h"
-#include "TempDir.h"
+#include "host/Process.h"
 
 #include <httplib.h>
 
@@ -12,12 +12,6 @@
 #include <sstream>
 #include <thread>
 
-#include <poll.h>
-#include <spawn.h>
-#include <sys/wait.h>
-#include <unistd.h>
-
-extern char** environ;
 
 namespace kyn::sim {
 namespace {
@@ -42,117 +36,70 @@ httplib::Result post(const std::filesystem::path& ca, const std::string& address
 // The program itself: ready line, port file, SIGTERM, exit status, and no token in its output.
 class ProgramTest : public ::testing::Test {
  protected:
-  struct Run {
-    pid_t pid = -1;
-    int out = -1;
-    int err = -1;
-  };
-
-  Run spawn(std::vector<std::string> args) {
-    int out[2], err[2];
-    EXPECT_EQ(::pipe(out), 0);
-    EXPECT_EQ(::pipe(err), 0);
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_adddup2(&actions, out[1], 1);
-    posix_spawn_file_actions_adddup2(&actions, err[1], 2);
-    posix_spawn_file_actions_addclose(&actions, out[0]);
-    posix_spawn_file_actions_addclose(&actions, err[0]);
+  /// kyn-sim with `args`; its standard error goes to a file of its own in the test's directory.
+  std::unique_ptr<host::Process> spawn(std::vector<std::string> args) {
     args.insert(args.begin(), KYN_SIM_BINARY);
-    std::vector<char*> argv;
-    for (auto& a : args) argv.push_back(a.data());
-    argv.push_back(nullptr);
-    // The token travels in the child's environment only.
-    std::string token = std::string("KYN_SIM_TOKEN=") + kToken;
-    std::vector<char*> env;
-    for (char** e = environ; *e; ++e) env.push_back(*e);
-    env.push_back(token.data());
-    env.push_back(nullptr);
-    Run run;
-    EXPECT_EQ(posix_spawn(&run.pid, KYN_SIM_BINARY, &actions, nullptr, argv.data(), env.data()), 0);
-    posix_spawn_file_actions_destroy(&actions);
-    ::close(out[1]);
-    ::close(err[1]);
-    run.out = out[0];
-    run.err = err[0];
-    return run;
+    host::SpawnOptions options;
+    options.captureOutput = true;
+    options.errorFile = dir.path() / ("stderr-" + std::to_string(++spawned_));
+    options.environment = {std::string("KYN_SIM_TOKEN=") + kToken};  // the token travels in the child's environment only
+    options.endWithParent = true;
+    return std::make_unique<host::Process>(args, options);
   }
+  /// What the last program spawned wrote on standard error.
+  std::string errors() const { return readFile(dir.path() / ("stderr-" + std::to_string(spawned_))); }
 
-  // Reads until a newline or the end; the time limit only guards against a hang.
-  static std::string readLine(int fd) {
-    std::string line;
-    char c;
-    pollfd p{fd, POLLIN, 0};
-    while (::poll(&p, 1, 20'000) == 1 && ::read(fd, &c, 1) == 1 && c != '\n') line += c;
-    return line;
-  }
-  static std::string readAll(int fd) {
-    std::string text;
-    char buffer[4096];
-    for (ssize_t n; (n = ::read(fd, buffer, sizeof buffer)) > 0;) text.append(buffer, static_cast<std::size_t>(n));
-    ::close(fd);
-    return text;
-  }
-  static int exitStatus(pid_t pid) {
-    int status = 0;
-    ::waitpid(pid, &status, 0);
-    return WIFEXITED(status) ? WEXITSTATUS(status) : -WTERMSIG(status);
-  }
-
-  test::TempDir dir;
+  host::TempDir dir;
+  int spawned_ = 0;
 };
 
 TEST_F(ProgramTest, ServesUntilSigtermAndExitsCleanly) {
-  writeFileAtomically(dir / "friends.json", kData);
-  Run run = spawn({"--person", kPerson, "--data", (dir / "friends.json").string(), "--port", "0", "--ca-out",
-                   (dir / "ca.pem").string(), "--port-file", (dir / "port").string()});
-  const std::string ready = readLine(run.out);
-  const std::string port = readFile(dir / "port");
+  writeFileAtomically(dir.path() / "friends.json", kData);
+  auto run = spawn({"--person", kPerson, "--data", (dir.path() / "friends.json").string(), "--port", "0", "--ca-out",
+                    (dir.path() / "ca.pem").string(), "--port-file", (dir.path() / "port").string()});
+  const std::string ready = run->readLine().value_or("");
+  const std::string port = readFile(dir.path() / "port");
   EXPECT_EQ(ready, "kyn-sim listening on https://127.0.0.1:" + port.substr(0, port.size() - 1));
 
-  auto res = post(dir / "ca.pem", "127.0.0.1", std::stoi(port), kToken);
+  auto res = post(dir.path() / "ca.pem", "127.0.0.1", std::stoi(port), kToken);
   ASSERT_TRUE(res);
   EXPECT_EQ(res->status, 200);
 
-  ::kill(run.pid, SIGTERM);
-  EXPECT_EQ(exitStatus(run.pid), 0);
-  const std::string output = readAll(run.out) + readAll(run.err);
-  EXPECT_EQ(output, "");
+  EXPECT_EQ(run->stop(), 0);
+  EXPECT_EQ(run->readAll() + errors(), "");
 }
 
 TEST_F(ProgramTest, MoveReachesTheRunningServerThroughItsControlFile) {
-  writeFileAtomically(dir / "friends.json", kData);
-  const auto control = dir / "control.json";
-  Run server = spawn({"--person", kPerson, "--data", (dir / "friends.json").string(), "--ca-out",
-                      (dir / "ca.pem").string(), "--control-file", control.string()});
-  const std::string ready = readLine(server.out);
+  writeFileAtomically(dir.path() / "friends.json", kData);
+  const auto control = dir.path() / "control.json";
+  auto server = spawn({"--person", kPerson, "--data", (dir.path() / "friends.json").string(), "--ca-out",
+                       (dir.path() / "ca.pem").string(), "--control-file", control.string()});
+  const std::string ready = server->readLine().value_or("");
   const int port = std::stoi(ready.substr(ready.rfind(':') + 1));
   EXPECT_EQ(std::filesystem::status(control).permissions() & std::filesystem::perms::all,
             std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);  // it holds the secret
 
-  Run move = spawn({"move", "--control", control.string(), "ada@example.com", "-33.9", "-70.5"});
-  EXPECT_EQ(exitStatus(move.pid), 0) << readAll(move.err);
-  EXPECT_EQ(Json::parse(readAll(move.out))["location"]["longitude"], -70.5);
-  auto res = post(dir / "ca.pem", "127.0.0.1", port, kToken);
+  auto move = spawn({"move", "--control", control.string(), "ada@example.com", "-33.9", "-70.5"});
+  const std::string moved = move->readAll();
+  EXPECT_EQ(move->wait(), 0) << errors();
+  EXPECT_EQ(Json::parse(moved)["location"]["longitude"], -70.5);
+  auto res = post(dir.path() / "ca.pem", "127.0.0.1", port, kToken);
   ASSERT_TRUE(res);
   EXPECT_EQ(Json::parse(res->body)["locations"]["ada@example.com"]["location"]["latitude"], -33.9);
 
   move = spawn({"move", "--control", control.string(), "eve@example.com", "1", "2"});
-  EXPECT_EQ(exitStatus(move.pid), 1);
-  EXPECT_NE(readAll(move.err).find("eve@example.com"), std::string::npos);
-  readAll(move.out);
+  (void)move->readAll();
+  EXPECT_EQ(move->wait(), 1);
+  EXPECT_NE(errors().find("eve@example.com"), std::string::npos);
 
-  ::kill(server.pid, SIGTERM);
-  EXPECT_EQ(exitStatus(server.pid), 0);
-  readAll(server.out);
-  readAll(server.err);
+  EXPECT_EQ(server->stop(), 0);
 }
 
 TEST_F(ProgramTest, AMissingDataSetIsAStartupError) {
-  Run run = spawn({"--person", kPerson, "--data", (dir / "nothing.json").string()});
-  EXPECT_EQ(exitStatus(run.pid), 2);
-  EXPECT_EQ(readAll(run.out), "");
-  const std::string err = readAll(run.err);
+  auto run = spawn({"--person", kPerson, "--data", (dir.path() / "nothing.json").string()});
+  EXPECT_EQ(run->readAll(), "");
+  EXPECT_EQ(run->wait(), 2);
+  const std::string err = errors();
   EXPECT_NE(err.find("nothing.json"), std::string::npos) << err;
   EXPECT_EQ(err.find(kToken), std::string::npos);
 }
