@@ -49,11 +49,6 @@ TEST_F(ShowHideLocationCmdTest, TheResultIsTheResponseAndTheRecordAsRequested) {
   EXPECT_FALSE(result->myLocation->isVisible);
   EXPECT_EQ(result->myLocation->friendHandle(), "sam@example.com");
   EXPECT_NE(result->myLocation->friendLocation(true), "Home");
-
-  ShowHideLocationCmd unparsed;
-  unparsed.setTransferResult(true, platform::HTTPResponse{200});
-  unparsed.setResponseBody("not json");
-  EXPECT_FALSE(unparsed.result());
 }
 
 }  // namespace

@@ -90,11 +90,7 @@ TEST_F(VisibilityEndToEnd, AFriendStopsSeeingTheLocationUntilItIsShownAgain) {
   EXPECT_EQ(shown.output, "Vos amis peuvent de nouveau voir votre position.\n");
   EXPECT_EQ(samSeenByAda(), 45.5231);
 
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", sam, "visibility", "sideways"}).status, 2);
-  sim->stop();
-  const auto down = runProgram({KYN_CLI_PATH, "--config", sam, "visibility", "hide"});
-  EXPECT_EQ(down.status, 1);
-  EXPECT_EQ(down.output, "The Kyn service is not available right now. Try again later.\n");
+  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", sam, "visibility", "sideways"}).status, 2);  // not taken as "hide"
 }
 
 }  // namespace
