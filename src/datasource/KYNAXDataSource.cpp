@@ -2,6 +2,7 @@
 
 #include "account/Common.h"
 #include "commands/GetLocationsCmd.h"
+#include "commands/ShowHideLocationCmd.h"
 #include "datasource/ReplyCallback.h"
 #include "platform/Services.h"
 #include "platform/resources/Resources.h"
@@ -72,7 +73,42 @@ void KYNAXDataSource::search(const AXKynSearch& command, AXCompletion completion
   request->friends = command.friends;
   request->proximity = command.proximity;
 
-  auto callback = replyCallback(request, std::move(completion), &searchReply);
+  send(request, replyCallback(request, std::move(completion), &searchReply));
+}
+
+namespace {
+
+/// The reply to a finished show/hide request: completed for any positive body status after a
+/// successful transfer; "not available" for every other outcome, an HTTP 401 and a body that does
+/// not parse included.
+std::shared_ptr<AXObject> visibilityReply(ShowHideLocationCmd& command) {
+  auto& log = services().log();
+  if (command.wasSuccessful()) {
+    // The result exists only for a parsed response; reading it also fills the status code.
+    const auto result = command.result();
+    log.notice("Result: %@", result);
+    const std::int32_t status = platform::int32Value(command.statusCode() ? &*command.statusCode() : nullptr);
+    if (result && status > 0) {
+      auto completed = AXKynVisibilitySetCompleted::visibilitySetCompleted();
+      completed->searchContext = command.contextIdentifierURL();
+      return completed;
+    }
+    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceNotAvailableErrorCode);
+  }
+  log.notice("ERROR: Server HTTP Status: %ld", command.response() ? command.response()->statusCode : 0);
+  return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceNotAvailableErrorCode);
+}
+
+}  // namespace
+
+void KYNAXDataSource::setVisibility(const AXKynVisibilityStateSet& command, AXCompletion completion) {
+  auto request = std::make_shared<ShowHideLocationCmd>();
+  request->hideLocation = !command.visible.value_or(false);
+  services().log().notice("KYNAXDataSource: SetVisibility with completion");
+  send(request, replyCallback(request, std::move(completion), &visibilityReply));
+}
+
+void KYNAXDataSource::send(const std::shared_ptr<platform::KYJSONCommand>& request, std::function<void()> callback) {
   auto controller = serverInteractionController();
   if (!controller) {
     // Only a C++ host that took the controller away gets here: answer rather than leave it waiting.

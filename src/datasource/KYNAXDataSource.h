@@ -24,6 +24,10 @@ class KYNAXDataSource {
   /// Sends a get-locations request for a validated search and returns at once; `completion` gets
   /// the reply's dictionary once the server has answered.
   void search(const AXKynSearch& command, AXCompletion completion);
+  /// Sends a show/hide-location request for a validated visibility command (hiding the location
+  /// exactly when `visible` is not yes) and returns at once; `completion` gets the reply's dictionary
+  /// once the server has answered.
+  void setVisibility(const AXKynVisibilityStateSet& command, AXCompletion completion);
 
   /// Reads the "MockLocations" resource into `mockLocations` unless already read. No request path
   /// uses it.
@@ -37,6 +41,9 @@ class KYNAXDataSource {
   [[nodiscard]] const std::optional<Value>& mockLocations() const noexcept { return mockLocations_; }
 
  private:
+  /// Hands the command to the controller; without one, answers it at once.
+  void send(const std::shared_ptr<platform::KYJSONCommand>& request, std::function<void()> callback);
+
   mutable std::mutex mutex_;
   std::shared_ptr<platform::KYServerInteractionController> controller_;
   std::optional<Value> mockLocations_;

@@ -6,6 +6,7 @@
 #include "contacts/ContactsUtilities.h"
 #include "datasource/KYNAXDataSource.h"
 #include "handlers/KYNAXSearch.h"
+#include "handlers/KYNAXVisibility.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
@@ -124,7 +125,15 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
     search->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
     return;
   }
-  if (*className == AXKynVisibilityStateSet::kClassName || *className == AXKynGeoFenceSet::kClassName) {
+  if (*className == AXKynVisibilityStateSet::kClassName) {
+    auto visibility = std::make_shared<KYNAXVisibility>();
+    AXKynVisibilityStateSet::readFields(*visibility, *command);
+    // Without the flag the command would read as "hide": refused rather than guessed.
+    if (!visibility->visible) return reply->fail("The visibility command needs \"visible\": true or false");
+    visibility->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    return;
+  }
+  if (*className == AXKynGeoFenceSet::kClassName) {
     return reply->fail(*className + " is not supported by this version of the plug-in");
   }
   reply->fail("Unknown command class: " + *className);

@@ -1,27 +1,16 @@
 #include "commands/GetLocationsCmd.h"
 #include "datasource/KYNAXDataSource.h"
 #include "datasource/ReplyCallback.h"
-#include "support/FakeContactStore.h"
-#include "support/FakeController.h"
-#include "support/PlatformTest.h"
+#include "support/ControllerTest.h"
 
 namespace kyn {
 namespace {
 
-using platform::services;
-
-class KYNAXDataSourceTest : public test::PlatformTest {
+class KYNAXDataSourceTest : public test::ControllerTest {
  protected:
   void SetUp() override {
-    PlatformTest::SetUp();
-    services().contactStore.set(std::make_shared<test::FakeContactStore>());
+    ControllerTest::SetUp();
     systemInfo->signIn();
-    controller = std::make_shared<test::FakeController>();
-    KYNAXDataSource::dataSource().setServerInteractionController(controller);
-  }
-  void TearDown() override {
-    KYNAXDataSource::dataSource().setServerInteractionController(nullptr);
-    PlatformTest::TearDown();
   }
 
   /// Runs a search whose exchange ends with `response`; returns the reply and the command sent.
@@ -40,8 +29,6 @@ class KYNAXDataSourceTest : public test::PlatformTest {
     EXPECT_FALSE(command->completionBlock()) << "the callback must break the cycle";
     return {replies.empty() ? Value() : replies.front(), command};
   }
-
-  std::shared_ptr<test::FakeController> controller;
 };
 
 TEST_F(KYNAXDataSourceTest, OneSharedInstanceWithAController) {

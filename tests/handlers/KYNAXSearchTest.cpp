@@ -1,27 +1,16 @@
 #include "account/Common.h"
 #include "datasource/KYNAXDataSource.h"
 #include "handlers/KYNAXSearch.h"
-#include "support/FakeContactStore.h"
-#include "support/FakeController.h"
-#include "support/PlatformTest.h"
+#include "support/ControllerTest.h"
 
 namespace kyn {
 namespace {
 
-using platform::services;
-
-class KYNAXSearchTest : public test::PlatformTest {
+class KYNAXSearchTest : public test::ControllerTest {
  protected:
   void SetUp() override {
-    PlatformTest::SetUp();
-    services().contactStore.set(std::make_shared<test::FakeContactStore>());
-    controller = std::make_shared<test::FakeController>();
+    ControllerTest::SetUp();
     controller->autoResponse = test::FakeResponse{true, 200, R"({"locations":{}})"};
-    KYNAXDataSource::dataSource().setServerInteractionController(controller);
-  }
-  void TearDown() override {
-    KYNAXDataSource::dataSource().setServerInteractionController(nullptr);
-    PlatformTest::TearDown();
   }
   /// Performs and returns every reply, checking that each came before perform returned.
   std::vector<Value> perform(KYNAXSearch& search) {
@@ -29,7 +18,6 @@ class KYNAXSearchTest : public test::PlatformTest {
     search.performWithCompletion([&](const Value& r) { replies.push_back(r); });
     return replies;
   }
-  std::shared_ptr<test::FakeController> controller;
 };
 
 TEST_F(KYNAXSearchTest, WithoutATargetTheReasonAnswersAndTheAccountIsKeptCached) {

@@ -74,6 +74,12 @@ class PluginAgainstSim(unittest.TestCase):
         replies = asyncio.run(many())
         self.assertEqual([r["class"] for r in replies], ["AXKynSearchCompleted"] * 6)
 
+    def test_my_location_is_hidden_and_shown_again(self):
+        for visible in (False, True):
+            reply = self.plugin.set_visibility(visible)
+            self.assertEqual(reply["class"], "AXKynVisibilitySetCompleted", reply)
+            self.assertTrue(reply["searchContext"].startswith("kynServerContext://serverContext?"), reply)
+
     def test_failures_come_back_as_replies_or_errors(self):
         self.assertEqual(self.plugin.search(), {"class": "AXCommandFailed",
                                                 "reason": "Need at least emails or current location"})

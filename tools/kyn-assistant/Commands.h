@@ -49,4 +49,16 @@ class AccountCommand final : public HostCommand {
   std::string personId_, username_, host_;
 };
 
+/// `visibility show|hide`: shows my location to my friends again, or hides it from them.
+class VisibilityCommand final : public AssistantCommand {
+ public:
+  explicit VisibilityCommand(CLI::App& app);
+  [[nodiscard]] bool chosen() const override { return sub_->parsed(); }
+  [[nodiscard]] Json build(Session& session) override;
+
+ private:
+  CLI::App* sub_;
+  std::string state_;
+};
+
 }  // namespace kyn::cli

@@ -129,6 +129,11 @@ void printReply(Session& session, const Json& command, const Json& reply, std::o
     out << failureInWords(session.texts, reply) << "\n";
   } else if (kind == "AXKynSearchCompleted") {
     printSearch(session, command, reply, out);
+  } else if (kind == "AXKynVisibilitySetCompleted") {
+    // As the plug-in reads the flag: a boolean, or a number other than zero (a raw command may say 1).
+    const Json flag = command.is_object() ? command.value("visible", Json()) : Json();
+    const bool visible = flag.is_boolean() ? flag.get<bool>() : flag.is_number() && flag.get<double>() != 0;
+    out << session.texts[visible ? Text::LocationShown : Text::LocationHidden] << "\n";
   } else {
     out << reply.dump(2) << "\n";
   }

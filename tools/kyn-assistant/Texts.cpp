@@ -117,6 +117,13 @@ constexpr Row kTable[] = {
   {Text::AccountRestricted, {"Restricted:  %s", "Eingeschränkt: %s", "Restreint :   %s"}},
   {Text::Yes, {"yes", "ja", "oui"}},
   {Text::No, {"no", "nein", "non"}},
+  // visibility
+  {Text::LocationHidden, {"Your location is now hidden from your friends.",
+                          "Dein Standort ist jetzt vor deinen Freunden verborgen.",
+                          "Votre position est désormais masquée pour vos amis."}},
+  {Text::LocationShown, {"Your friends can see your location again.",
+                         "Deine Freunde können deinen Standort wieder sehen.",
+                         "Vos amis peuvent de nouveau voir votre position."}},
 };
 // clang-format on
 

@@ -55,6 +55,9 @@ enum class Text {
   AccountRestricted,   // %s: yes or no
   Yes,
   No,
+  // visibility
+  LocationHidden,
+  LocationShown,
   Count
 };
 

@@ -1,0 +1,58 @@
+#include "commands/ShowHideLocationCmd.h"
+
+#include "platform/Services.h"
+#include "platform/value/Json.h"
+#include "utils/KYNAXUtils.h"
+
+namespace kyn {
+
+using platform::member;
+using platform::services;
+
+std::string ShowHideLocationResult::description() const {
+  return "(" + platform::toJson(response) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
+}
+
+std::string ShowHideLocationCmd::path() const { return std::string(KYNUrlBase) + "showHideLocation"; }
+
+std::optional<Value> ShowHideLocationCmd::currentLocationDictionary() const {
+  return KYNAXUtils::dictionaryForLocation(currentLocation);
+}
+
+Value ShowHideLocationCmd::jsonBodyDictionary() const {
+  Value body = KYNBaseCmd::jsonBodyDictionary();
+  Value context = body["clientContext"];  // a copy: the shared context stays as it is
+  if (auto here = currentLocationDictionary()) context["location"] = std::move(*here);
+  body["clientContext"] = std::move(context);
+  body["prefs"] = Value{{"hideLocation", hideLocation ? "Yes" : "No"}};
+  return body;
+}
+
+std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
+  auto& log = services().log();
+  const Value* response = jsonResponseDictionary();
+  if (response == nullptr) return nullptr;
+  auto out = std::make_shared<ShowHideLocationResult>();
+  out->response = *response;
+
+  const Value* myInfo = member(response, "myInfo");
+  if (myInfo != nullptr && !myInfo->is_object()) myInfo = nullptr;
+  std::optional<Value> context;
+  if (const Value* serverContext = member(response, "serverContext"); serverContext && serverContext->is_object()) {
+    context = *serverContext;
+  }
+  const auto preferredEmail = platform::stringValue(member(myInfo, "preferredEmail"));
+  // Folded into the server's context only: without one there is nothing to carry back.
+  if (preferredEmail && context) (*context)["preferredEmail"] = *preferredEmail;
+  log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
+  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
+  if (log.isEnabled(platform::LogLevel::Default)) {
+    log.notice("visibility_response: %@", "(" + platform::toJson(out->response) + ")");  // the record is not in yet
+  }
+
+  // The record shows what was asked for: once the exchange succeeded, the request is trusted.
+  out->myLocation = KYNAXMyLocation::myLocation(!hideLocation, myInfo, preferredEmail);
+  return out;
+}
+
+}  // namespace kyn

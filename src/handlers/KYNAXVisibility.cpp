@@ -1,0 +1,43 @@
+#include "handlers/KYNAXVisibility.h"
+
+#include "account/Common.h"
+#include "datasource/KYNAXDataSource.h"
+#include "platform/Services.h"
+
+namespace kyn {
+
+using platform::services;
+
+std::shared_ptr<AXCommandFailed> KYNAXVisibility::_validate() {
+  auto& log = services().log();
+  log.notice("KYNAXVisibility validate");
+  Common& common = Common::sharedInstance();
+  if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
+  if (common.isAppRestricted()) {
+    // Checked before the account is dropped: a restricted user's cached account stays as it is.
+    log.notice("App is restricted, cannot change visibility");
+    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceNotAvailableErrorCode);
+  }
+  log.notice("KYNAXVisibility clearing KYNAccount");
+  common.clearKYNAccount();  // the checks below read the account afresh
+  if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
+  log.notice("KYNAXVisibility Checking provisionning");
+  if (!services().session.get()->isProvisionedForLocationSharing()) {
+    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInAccountErrorCode);
+  }
+  log.notice("KYNAXVisibility Checking auth token");
+  if (common.tokenIsNotAccessible()) return AXCommandFailed::commandFailedWithErrorCode(AXKynLockedErrorCode);
+  return nullptr;
+}
+
+void KYNAXVisibility::performWithCompletion(AXCompletion completion) {
+  auto failure = _validate();
+  services().log().notice("KYNAXVisibility performWithCompletion %@", failure);
+  if (failure) {
+    if (completion) completion(failure->dictionary());
+    return;
+  }
+  KYNAXDataSource::dataSource().setVisibility(*this, std::move(completion));
+}
+
+}  // namespace kyn
