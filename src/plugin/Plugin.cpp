@@ -6,6 +6,7 @@
 #include "contacts/ContactsUtilities.h"
 #include "datasource/KYNAXDataSource.h"
 #include "handlers/KYNAXSearch.h"
+#include "handlers/KYNAXSetGeoFence.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
@@ -124,7 +125,13 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
     search->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
     return;
   }
-  if (*className == AXKynVisibilityStateSet::kClassName || *className == AXKynGeoFenceSet::kClassName) {
+  if (*className == AXKynGeoFenceSet::kClassName) {
+    auto fence = std::make_shared<KYNAXSetGeoFence>();
+    AXKynGeoFenceSet::readFields(*fence, *command);
+    fence->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    return;
+  }
+  if (*className == AXKynVisibilityStateSet::kClassName) {
     return reply->fail(*className + " is not supported by this version of the plug-in");
   }
   reply->fail("Unknown command class: " + *className);
