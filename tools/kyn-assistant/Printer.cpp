@@ -1,4 +1,5 @@
 // The reply for a person to read, in the assistant's language.
+#include "Commands.h"
 #include "Host.h"
 
 #include <cctype>
@@ -129,6 +130,8 @@ void printReply(Session& session, const Json& command, const Json& reply, std::o
     out << failureInWords(session.texts, reply) << "\n";
   } else if (kind == "AXKynSearchCompleted") {
     printSearch(session, command, reply, out);
+  } else if (kind == "AXKynGeoFenceSetCompleted") {
+    printGeoFence(session, command, reply, out);
   } else {
     out << reply.dump(2) << "\n";
   }
