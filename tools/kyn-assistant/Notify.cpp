@@ -90,7 +90,8 @@ NotifyCommand::NotifyCommand(CLI::App& app)
     : sub_(app.add_subcommand("notify",
                               "Tell me when a friend arrives at, leaves or is at a place (or tell the friend when I "
                               "do). Sets, changes or switches off the notification.")) {
-  sub_->add_option("-f,--friend", friend_, "The friend: an e-mail address, a phone number, or a name from your contacts")
+  sub_->add_option("-f,--friend", friend_,
+                   "The friend: an e-mail address, a phone number, or a name from your contacts")
       ->required();
   auto* when = sub_->add_option_group("when", "When the notification comes (one of them)");
   when->add_flag("--arrives", arrives_, "When the friend arrives at the place");
@@ -98,7 +99,8 @@ NotifyCommand::NotifyCommand(CLI::App& app)
   when->add_flag("--now", now_, "As soon as the friend is at the place: now, or at the next arrival (once only)");
   when->require_option(1);
   auto* where = sub_->add_option_group("where", "The place (one of them)");
-  auto* place = where->add_option("--place", place_, "The name of the place (\"Work\"), one of your places or a new one");
+  auto* place =
+      where->add_option("--place", place_, "The name of the place (\"Work\"): one of your places, or a new one");
   where->add_option("--address", address_,
                     "The place's address: \"street, city[, state][, postal code][, country code]\"; leave a part "
                     "empty to skip it (\"Beispielstraße 5, Berlin, , DE\")");
@@ -110,13 +112,7 @@ NotifyCommand::NotifyCommand(CLI::App& app)
 }
 
 Json NotifyCommand::build(Session& session) {
-  Json location = {{"class", "AXLocation"}};
-  if (!placeAt_.empty()) {
-    auto at = parseCoordinate(placeAt_, false);
-    if (!at) throw UsageError(session.texts.format(Text::BadPlaceAt, placeAt_));
-    location = *at;
-  }
-  if (!place_.empty()) location["label"] = place_;
+  Json location = namedPlace(session, place_, placeAt_);
   if (!address_.empty()) {
     auto fields = parseAddress(address_);
     if (!fields) throw UsageError(session.texts.format(Text::BadAddress, address_));
