@@ -254,14 +254,18 @@ class Plugin:
         """Tell me (or them) when `friend` arrives at, leaves or is now at a place.
 
         The place is a label, a coordinate, or an address: a mapping with any of "street",
-        "thoroughfare", "city", "stateCode", "postalCode", "countryCode".
+        "thoroughfare", "city", "stateCode", "postalCode", "countryCode". Without any, the place is
+        where the friend is now ("tell me when Ada leaves").
         """
-        location = _location(place_at, place) or {"class": "AXLocation"}
-        for key, value in (address or {}).items():
-            location[key] = value
-        return {"class": "AXKynGeoFenceSet", "friend": self.person(friend), "requestedLocation": location,
-                "geoFenceTrigger": trigger, "oneTimeOnly": bool(once),
-                "fenceType": NOTIFY_OTHERS if notify_them else NOTIFY_ME, "enable": bool(enable)}
+        location = _location(place_at, place)
+        if address:
+            location = {**(location or {"class": "AXLocation"}), **address}
+        command = {"class": "AXKynGeoFenceSet", "friend": self.person(friend)}
+        if location is not None:
+            command["requestedLocation"] = location
+        command.update({"geoFenceTrigger": trigger, "oneTimeOnly": bool(once),
+                        "fenceType": NOTIFY_OTHERS if notify_them else NOTIFY_ME, "enable": bool(enable)})
+        return command
 
     def set_geofence(self, *args: Any, **kwargs: Any) -> dict:
         return self.perform(self.geofence_command(*args, **kwargs))

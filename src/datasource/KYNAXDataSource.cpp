@@ -2,6 +2,7 @@
 
 #include "account/Common.h"
 #include "commands/GetLocationsCmd.h"
+#include "commands/SetGeoFenceCmd.h"
 #include "commands/ShowHideLocationCmd.h"
 #include "datasource/ReplyCallback.h"
 #include "platform/Services.h"
@@ -117,6 +118,50 @@ void KYNAXDataSource::send(const std::shared_ptr<platform::KYJSONCommand>& reque
     return;
   }
   controller->sendCommand(request, std::move(callback));
+}
+
+namespace {
+
+/// The reply to a finished geofence request. The body's status code alone decides, whatever became
+/// of the transfer: each failure code has its error, 200 to 299 is the fence set, anything else
+/// "not available".
+std::shared_ptr<AXObject> geoFenceReply(SetGeoFenceCmd& command) {
+  auto& log = services().log();
+  // Reading the result parses the response and so fills the status code: it comes first.
+  auto fence = command.result();
+  const std::int64_t status = platform::integerValue(command.statusCode() ? &*command.statusCode() : nullptr);
+  log.notice("Server HTTP Status: %ld", status);
+  log.notice("GeoFenceResult: %@", fence);
+  const auto failed = [](std::int64_t code) { return AXCommandFailed::commandFailedWithErrorCode(code); };
+  if (status == 411) return failed(AXKynNotAFriendErrorCode);
+  if (status == 417) return failed(AXKynNoFriendsErrorCode);
+  if (status == 500) return failed(AXKynGeoFenceNotCreatedErrorCode);
+  if (status == 521) return failed(AXKynLabelNotFoundErrorCode);
+  if (status >= 541 && status <= 544) return failed(AXKynGeoFenceNotCreatedErrorCode);
+  if (status == 401) return failed(AXKynNotLoggedInErrorCode);
+  if (status == 535) return failed(AXKynAddressNotFoundErrorCode);
+  if (status < 200 || status > 299) return failed(AXKynServiceNotAvailableErrorCode);
+  auto completed = AXKynGeoFenceSetCompleted::geoFenceSetCompleted();
+  completed->searchContext = command.contextIdentifierURL();
+  completed->geoFence = std::move(fence);
+  return completed;
+}
+
+}  // namespace
+
+void KYNAXDataSource::setGeoFence(const AXKynGeoFenceSet& command, AXCompletion completion) {
+  auto request = std::make_shared<SetGeoFenceCmd>();
+  request->axPerson = command.friend_;
+  request->setLocation(command.requestedLocation);  // as the assistant gave it: the address is read from it
+  request->trigger = command.geoFenceTrigger;
+  request->onetimeonly = command.oneTimeOnly.value_or(false);
+  request->fenceType = command.fenceType;
+  request->enable = command.enable.value_or(false);
+
+  auto callback = replyCallback(request, std::move(completion), &geoFenceReply);
+  if (auto controller = serverInteractionController()) return controller->sendCommand(request, std::move(callback));
+  request->setCompletionBlock(callback);  // no controller (a C++ host took it away): answered at once
+  callback();
 }
 
 void KYNAXDataSource::loadMockLocationData() {

@@ -29,6 +29,10 @@ class KYNAXDataSource {
   /// once the server has answered.
   void setVisibility(const AXKynVisibilityStateSet& command, AXCompletion completion);
 
+  /// Sends a set-geofence request for a validated geofence command and returns at once;
+  /// `completion` gets the reply's dictionary once the server has answered.
+  void setGeoFence(const AXKynGeoFenceSet& command, AXCompletion completion);
+
   /// Reads the "MockLocations" resource into `mockLocations` unless already read. No request path
   /// uses it.
   void loadMockLocationData();

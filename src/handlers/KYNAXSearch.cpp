@@ -1,7 +1,7 @@
 #include "handlers/KYNAXSearch.h"
 
-#include "account/Common.h"
 #include "datasource/KYNAXDataSource.h"
+#include "handlers/AccountChecks.h"
 #include "platform/Services.h"
 
 namespace kyn {
@@ -18,16 +18,7 @@ std::shared_ptr<AXCommandFailed> checkSearch(const KYNAXSearch& search) {
                          (last && last->phones && !last->phones->empty()) || search.currentLocation ||
                          search.proximity;
   if (!hasTarget) return AXCommandFailed::commandFailedWithReason("Need at least emails or current location");
-
-  Common& common = Common::sharedInstance();
-  if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
-  common.clearKYNAccount();  // the checks below read the account afresh
-  if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
-  if (!services().session.get()->isProvisionedForLocationSharing()) {
-    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInAccountErrorCode);
-  }
-  if (common.tokenIsNotAccessible()) return AXCommandFailed::commandFailedWithErrorCode(AXKynLockedErrorCode);
-  return nullptr;
+  return accountCheckFailure();
 }
 
 }  // namespace

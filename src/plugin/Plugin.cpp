@@ -7,6 +7,7 @@
 #include "datasource/KYNAXDataSource.h"
 #include "handlers/KYNAXSearch.h"
 #include "handlers/KYNAXVisibility.h"
+#include "handlers/KYNAXSetGeoFence.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
@@ -134,7 +135,10 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
     return;
   }
   if (*className == AXKynGeoFenceSet::kClassName) {
-    return reply->fail(*className + " is not supported by this version of the plug-in");
+    auto fence = std::make_shared<KYNAXSetGeoFence>();
+    AXKynGeoFenceSet::readFields(*fence, *command);
+    fence->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    return;
   }
   reply->fail("Unknown command class: " + *className);
 }

@@ -8,7 +8,7 @@ import subprocess
 import tempfile
 import unittest
 
-from kyn_assistant import KynError, Plugin
+from kyn_assistant import ON_DEPARTURE, KynError, Plugin
 
 PERSON = "P-2000001"
 TOKEN = "tok-python-7c1d"
@@ -87,6 +87,21 @@ class PluginAgainstSim(unittest.TestCase):
             self.plugin.search(friends=["Nobody Known"])
         with self.assertRaises(KynError):
             Plugin(os.path.join(self.work.name, "missing"))
+
+    def test_set_geofence_where_ada_is_then_off_and_at_an_unknown_address(self):
+        # Nothing names a place: the fence goes where Ada is now.
+        command = self.plugin.geofence_command("ada@example.com", trigger=ON_DEPARTURE)
+        self.assertNotIn("requestedLocation", command)
+        reply = self.plugin.perform(command)
+        self.assertEqual(reply["class"], "AXKynGeoFenceSetCompleted", reply)
+        self.assertEqual((reply["geoFence"]["location"]["latitude"], reply["geoFence"]["trigger"]),
+                         (45.5152, ON_DEPARTURE))
+        self.assertEqual(reply["geoFence"]["friend"]["data"], "ada@example.com")
+        self.assertEqual(self.plugin.set_geofence("Ada", trigger=ON_DEPARTURE, enable=False)["class"],
+                         "AXKynGeoFenceSetCompleted")
+        unknown = self.plugin.set_geofence("Ada", address={"street": "9 Nowhere Road", "city": "Atlantis"},
+                                           notify_them=True)
+        self.assertEqual(unknown, {"class": "AXCommandFailed", "errorCode": 1010})
 
 
 class AccountAndClosedPlugin(unittest.TestCase):

@@ -25,16 +25,7 @@ Json SearchCommand::build(Session& session) {
     if (!location) throw UsageError(session.texts.format(Text::BadHere, here_));
     command["currentLocation"] = *location;
   }
-  if (!place_.empty() || !placeAt_.empty()) {
-    Json requested = {{"class", "AXLocation"}};
-    if (!placeAt_.empty()) {
-      auto location = parseCoordinate(placeAt_, false);
-      if (!location) throw UsageError(session.texts.format(Text::BadPlaceAt, placeAt_));
-      requested = *location;
-    }
-    if (!place_.empty()) requested["label"] = place_;
-    command["requestedLocation"] = requested;
-  }
+  if (!place_.empty() || !placeAt_.empty()) command["requestedLocation"] = namedPlace(session, place_, placeAt_);
   if (!proximity_.empty()) command["proximity"] = proximity_;
   return command;
 }

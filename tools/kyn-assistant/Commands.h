@@ -3,6 +3,7 @@
 #include "Host.h"
 
 #include <memory>
+#include <optional>
 #include <string>
 #include <vector>
 
@@ -60,5 +61,26 @@ class VisibilityCommand final : public AssistantCommand {
   CLI::App* sub_;
   std::string state_;
 };
+
+/// `notify`: tell me when a friend arrives at, leaves or is now at a place (or tell the friend when
+/// I do); sets, changes or switches off that notification.
+class NotifyCommand final : public AssistantCommand {
+ public:
+  explicit NotifyCommand(CLI::App& app);
+  [[nodiscard]] bool chosen() const override { return sub_->parsed(); }
+  [[nodiscard]] Json build(Session& session) override;
+
+ private:
+  CLI::App* sub_;
+  std::string friend_, place_, placeAt_, address_;
+  bool arrives_ = false, leaves_ = false, now_ = false, once_ = false, them_ = false, off_ = false;
+};
+
+/// A geofence set or switched off, in words: "I'll tell you when Ada Marlowe arrives at Work."
+void printGeoFence(Session& session, const Json& command, const Json& reply, std::ostream& out);
+
+/// "street, city[, state][, postal code][, country code]" as the address fields of an assistant
+/// location; nothing when the text does not fit that shape.
+[[nodiscard]] std::optional<Json> parseAddress(const std::string& text);
 
 }  // namespace kyn::cli

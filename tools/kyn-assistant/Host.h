@@ -74,6 +74,10 @@ class AssistantCommand : public HostCommand {
 /// text that is no coordinate.
 [[nodiscard]] std::optional<Json> parseCoordinate(const std::string& text, bool allowAccuracy);
 
+/// A place the user named, as an assistant location: its label (when not empty) and its coordinate
+/// "LAT,LON" (when not empty). Throws UsageError for a coordinate that does not read.
+[[nodiscard]] Json namedPlace(Session& session, const std::string& label, const std::string& coordinate);
+
 /// Prints the reply to `command` for a person, in the assistant's language.
 void printReply(Session& session, const Json& command, const Json& reply, std::ostream& out);
 

@@ -74,4 +74,15 @@ std::optional<Json> parseCoordinate(const std::string& text, bool allowAccuracy)
   return location;
 }
 
+Json namedPlace(Session& session, const std::string& label, const std::string& coordinate) {
+  Json place = {{"class", "AXLocation"}};
+  if (!coordinate.empty()) {
+    auto location = parseCoordinate(coordinate, false);
+    if (!location) throw UsageError(session.texts.format(Text::BadPlaceAt, coordinate));
+    place = *location;
+  }
+  if (!label.empty()) place["label"] = label;
+  return place;
+}
+
 }  // namespace kyn::cli

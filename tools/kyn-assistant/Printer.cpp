@@ -1,4 +1,5 @@
 // The reply for a person to read, in the assistant's language.
+#include "Commands.h"
 #include "Host.h"
 
 #include <cctype>
@@ -134,6 +135,8 @@ void printReply(Session& session, const Json& command, const Json& reply, std::o
     const Json flag = command.is_object() ? command.value("visible", Json()) : Json();
     const bool visible = flag.is_boolean() ? flag.get<bool>() : flag.is_number() && flag.get<double>() != 0;
     out << session.texts[visible ? Text::LocationShown : Text::LocationHidden] << "\n";
+  } else if (kind == "AXKynGeoFenceSetCompleted") {
+    printGeoFence(session, command, reply, out);
   } else {
     out << reply.dump(2) << "\n";
   }

@@ -58,6 +58,23 @@ enum class Text {
   // visibility
   LocationHidden,
   LocationShown,
+  // geofence: whom, where (%s: the friend's name, %s: the place)
+  FenceMeArrives,
+  FenceMeLeaves,
+  FenceMeNow,
+  FenceThemArrives,
+  FenceThemLeaves,
+  FenceThemNow,
+  FenceOffMeArrives,
+  FenceOffMeLeaves,
+  FenceOffMeNow,
+  FenceOffThemArrives,
+  FenceOffThemLeaves,
+  FenceOffThemNow,
+  FenceSet,          // a trigger the host does not know
+  FenceOff,          // the same, switched off
+  FenceOnce,
+  BadAddress,        // %s: the text given
   Count
 };
 

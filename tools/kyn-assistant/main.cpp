@@ -87,6 +87,7 @@ int main(int argc, char** argv) {
   commands.push_back(std::make_unique<RawCommand>(app));
   commands.push_back(std::make_unique<AccountCommand>(app));
   commands.push_back(std::make_unique<VisibilityCommand>(app));
+  commands.push_back(std::make_unique<NotifyCommand>(app));
   try {
     app.parse(argc, argv);
   } catch (const CLI::ParseError& e) {

@@ -34,11 +34,13 @@ inline constexpr std::int64_t AXKynAddressNotFoundErrorCode = 1010;
 /// The constant's name for an error code ("AXKynNotLoggedInErrorCode"), or nothing.
 [[nodiscard]] std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept;
 
-// Values of a geofence command's trigger and fence type.
+// Values of a geofence command's trigger (when the notice comes: the friend arrives, leaves, or is
+// there now or next) and fence type (whom it goes to: the user, or the friend about the user).
 inline constexpr std::string_view AXKynGeoFenceTriggerOnArrivalValue = "OnArrival";
 inline constexpr std::string_view AXKynGeoFenceTriggerOnDepartureValue = "OnDeparture";
 inline constexpr std::string_view AXKynGeoFenceTriggerImmediateValue = "Immediate";
-inline constexpr std::string_view AXKynFenceTypeNotifyMeValue = "NotifyMe";
+inline constexpr std::string_view AXKynFenceTypeNotifyMeValue = "Me";
+inline constexpr std::string_view AXKynFenceTypeNotifyOthersValue = "Others";
 
 /// An optional array of records (absent differs from empty).
 template <class T>

@@ -1,0 +1,20 @@
+#include "handlers/AccountChecks.h"
+
+#include "account/Common.h"
+#include "platform/Services.h"
+
+namespace kyn {
+
+std::shared_ptr<AXCommandFailed> accountCheckFailure() {
+  Common& common = Common::sharedInstance();
+  if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
+  common.clearKYNAccount();  // the checks below read the account afresh
+  if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
+  if (!platform::services().session.get()->isProvisionedForLocationSharing()) {
+    return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInAccountErrorCode);
+  }
+  if (common.tokenIsNotAccessible()) return AXCommandFailed::commandFailedWithErrorCode(AXKynLockedErrorCode);
+  return nullptr;
+}
+
+}  // namespace kyn
