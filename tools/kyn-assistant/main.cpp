@@ -78,7 +78,9 @@ int run(const Options& options, HostCommand& chosen) {
 }  // namespace
 
 int main(int argc, char** argv) {
-  CLI::App app{"kyn-assistant: asks the Kyn plug-in where your friends are, as a voice assistant would."};
+  CLI::App app{
+      "kyn-assistant: asks the Kyn plug-in, as a voice assistant would, where your friends are; shows or hides "
+      "your location; tells you (or them) when a friend arrives at or leaves a place; signs you in."};
   Options options;
   options.pluginPath = kyn::host::defaultPluginPath().string();
   defineOptions(app, options);
