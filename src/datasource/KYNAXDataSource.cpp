@@ -158,10 +158,7 @@ void KYNAXDataSource::setGeoFence(const AXKynGeoFenceSet& command, AXCompletion 
   request->fenceType = command.fenceType;
   request->enable = command.enable.value_or(false);
 
-  auto callback = replyCallback(request, std::move(completion), &geoFenceReply);
-  if (auto controller = serverInteractionController()) return controller->sendCommand(request, std::move(callback));
-  request->setCompletionBlock(callback);  // no controller (a C++ host took it away): answered at once
-  callback();
+  send(request, replyCallback(request, std::move(completion), &geoFenceReply));
 }
 
 void KYNAXDataSource::loadMockLocationData() {
