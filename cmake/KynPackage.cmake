@@ -16,6 +16,8 @@ set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
 set(CPACK_DEBIAN_PACKAGE_SECTION misc)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_NAME kyn-assistant)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_SHLIBDEPS ON)
+# A shlibs file, so that packages built against the library depend on a version that has its symbols.
+set(CPACK_DEBIAN_PACKAGE_GENERATE_SHLIBS ON)
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_DEPENDS "ca-certificates")
 set(CPACK_DEBIAN_RUNTIME_PACKAGE_RECOMMENDS "python3")
 set(CPACK_DEBIAN_DEV_PACKAGE_NAME kyn-assistant-dev)
