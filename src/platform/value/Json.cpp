@@ -1,6 +1,7 @@
 #include "platform/value/Json.h"
 
 #include <cmath>
+#include <deque>
 #include <memory>
 #include <unordered_map>
 #include <utility>
@@ -13,6 +14,11 @@ namespace {
 // nesting depth, rejects non-finite numbers, and indexes large objects so that checking each new key
 // for a duplicate stays constant time (an ordered object otherwise searches its members linearly,
 // which makes a large object quadratic to build).
+//
+// The members of an open object gather in a plain vector of (key, value) pairs and move into the
+// object only when it closes, into storage of the exact size. The object's own storage holds pairs
+// with a const key, which a growing vector copies rather than moves: every value already read,
+// with all it contains, would be copied again each time the object grew.
 class Builder {
  public:
   explicit Builder(std::size_t maxDepth) : maxDepth_(maxDepth) {}
@@ -32,40 +38,46 @@ class Builder {
     if (frames_.size() >= maxDepth_) return false;
     Value* v = put(Value::object());
     if (v == nullptr) return false;
-    frames_.push_back(Frame{v, nullptr, {}});
+    // Each depth keeps its member vector, so that the objects of one depth share its storage.
+    if (members_.size() <= frames_.size()) members_.resize(frames_.size() + 1);
+    frames_.push_back(Frame{v, nullptr, &members_[frames_.size()], {}});
     return true;
   }
 
   bool key(std::string& k) {
     Frame& f = frames_.back();
-    // ordered_map's operator[] looks up keys; index the vector underneath it instead.
-    auto& map = static_cast<Value::object_t::Container&>(f.container->get_ref<Value::object_t&>());
-    std::size_t index = map.size();
+    Members& members = *f.members;
+    std::size_t index = members.size();
     if (f.index) {
       auto it = f.index->find(k);
       if (it != f.index->end()) index = it->second;
     } else {
-      for (std::size_t i = 0; i < map.size(); ++i) {
-        if (map[i].first == k) {
+      for (std::size_t i = 0; i < members.size(); ++i) {
+        if (members[i].first == k) {
           index = i;
           break;
         }
       }
     }
-    if (index == map.size()) {
+    if (index == members.size()) {
       if (f.index) f.index->emplace(k, index);
-      map.emplace_back(std::move(k), Value());
-      if (!f.index && map.size() > kIndexThreshold) {
+      members.emplace_back(std::move(k), Value());
+      if (!f.index && members.size() > kIndexThreshold) {
         f.index = std::make_unique<std::unordered_map<std::string, std::size_t>>();
-        f.index->reserve(map.size() * 2);
-        for (std::size_t i = 0; i < map.size(); ++i) f.index->emplace(map[i].first, i);
+        f.index->reserve(members.size() * 2);
+        for (std::size_t i = 0; i < members.size(); ++i) f.index->emplace(members[i].first, i);
       }
     }
-    f.slot = &map[index].second;
+    f.slot = &members[index].second;
     return true;
   }
 
   bool end_object() {
+    Frame& f = frames_.back();
+    auto& object = static_cast<Value::object_t::Container&>(f.container->get_ref<Value::object_t&>());
+    object.reserve(f.members->size());
+    for (auto& [k, v] : *f.members) object.emplace_back(std::move(k), std::move(v));
+    f.members->clear();
     frames_.pop_back();
     return true;
   }
@@ -74,7 +86,7 @@ class Builder {
     if (frames_.size() >= maxDepth_) return false;
     Value* v = put(Value::array());
     if (v == nullptr) return false;
-    frames_.push_back(Frame{v, nullptr, {}});
+    frames_.push_back(Frame{v, nullptr, nullptr, {}});
     return true;
   }
 
@@ -92,10 +104,12 @@ class Builder {
 
  private:
   static constexpr std::size_t kIndexThreshold = 16;
+  using Members = std::vector<std::pair<std::string, Value>>;
 
   struct Frame {
     Value* container;
-    Value* slot;  // for objects: where the value of the last key goes
+    Value* slot;       // for objects: where the value of the last key goes
+    Members* members;  // for objects: the members read so far; nullptr for arrays
     std::unique_ptr<std::unordered_map<std::string, std::size_t>> index;
   };
 
@@ -105,7 +119,7 @@ class Builder {
       return &root_;
     }
     Frame& f = frames_.back();
-    if (f.container->is_array()) {
+    if (f.members == nullptr) {
       auto& array = f.container->get_ref<Value::array_t&>();
       array.push_back(std::move(v));
       return &array.back();
@@ -120,6 +134,7 @@ class Builder {
   std::size_t maxDepth_;
   Value root_;
   std::vector<Frame> frames_;
+  std::deque<Members> members_;  // by depth; a deque, so that growing it moves none
 };
 
 }  // namespace
