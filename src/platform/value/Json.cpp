@@ -192,6 +192,7 @@ constexpr std::size_t kKeptParserBytes = 256u * 1024u;
 /// The text read by simdjson, several times faster than nlohmann's own reader; nothing when
 /// simdjson refuses it, and then nlohmann's reader decides.
 std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) {
+  if (text.empty()) return std::nullopt;  // simdjson would copy from a null pointer
   // Surrogate escapes are left to nlohmann's reader, which refuses every unpaired one.
   for (std::size_t at = text.find("\\u"); at != std::string_view::npos; at = text.find("\\u", at + 2)) {
     if (at + 2 < text.size() && (text[at + 2] == 'd' || text[at + 2] == 'D')) return std::nullopt;
