@@ -1,6 +1,7 @@
 # Third-party libraries, all from Debian's packages (scripts/install-deps installs them).
 find_package(Threads REQUIRED)
 find_package(nlohmann_json 3.11 REQUIRED)
+find_package(simdjson REQUIRED)
 find_package(CURL REQUIRED)
 find_package(ICU 72 REQUIRED COMPONENTS uc i18n data)
 find_package(OpenSSL REQUIRED)

@@ -25,11 +25,21 @@ platform::ContactKeys ContactsUtilities::contactKeys() {
           std::string(InstantMessageAddresses)};
 }
 
+namespace {
+
+/// The key list of every look-up, made once.
+const platform::ContactKeys& fetchKeys() {
+  static const platform::ContactKeys keys = ContactsUtilities::contactKeys();
+  return keys;
+}
+
+}  // namespace
+
 ContactRef ContactsUtilities::contactForEmail(const std::optional<std::string>& emailAddress) {
   auto store = contactStore();
   if (!store || !emailAddress || emailAddress->empty()) return nullptr;
   std::string error;  // a failed query yields no match; the error itself is not reported
-  const auto matches = store->unifiedContactsMatchingEmailAddress(*emailAddress, contactKeys(), &error);
+  const auto matches = store->unifiedContactsMatchingEmailAddress(*emailAddress, fetchKeys(), &error);
   return findOptimalContactInContacts(&matches);
 }
 
@@ -37,7 +47,7 @@ ContactRef ContactsUtilities::contactForPhone(const std::optional<std::string>& 
   auto store = contactStore();
   if (!store || !phoneNumber || phoneNumber->empty()) return nullptr;
   std::string error;
-  const auto matches = store->unifiedContactsMatchingPhoneNumber(*phoneNumber, contactKeys(), &error);
+  const auto matches = store->unifiedContactsMatchingPhoneNumber(*phoneNumber, fetchKeys(), &error);
   return findOptimalContactInContacts(&matches);
 }
 
@@ -45,7 +55,7 @@ std::vector<ContactRef> ContactsUtilities::contactsForName(const std::string& na
   auto store = contactStore();
   if (!store || name.empty()) return {};
   std::string error;
-  return store->unifiedContactsMatchingName(name, contactKeys(), &error);
+  return store->unifiedContactsMatchingName(name, fetchKeys(), &error);
 }
 
 ContactRef ContactsUtilities::contactForAssistantId(const std::optional<std::string>& assistantIdentifier) {
@@ -54,7 +64,7 @@ ContactRef ContactsUtilities::contactForAssistantId(const std::optional<std::str
   if (!identifier) return nullptr;
   auto store = contactStore();
   if (!store) return nullptr;
-  return store->unifiedContactWithIdentifier(*identifier, contactKeys(), nullptr);
+  return store->unifiedContactWithIdentifier(*identifier, fetchKeys(), nullptr);
 }
 
 void ContactsUtilities::fillPersonFromContact(const platform::Contact& contact, AXPerson& person) {

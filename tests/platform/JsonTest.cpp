@@ -34,11 +34,12 @@ TEST(Json, DuplicateKeysKeepTheLastValueAtTheFirstPosition) {
 }
 
 TEST(Json, RejectsWhatIsNotOneValidDocument) {
-  for (const char* bad : {"", "{", "[1,]", "{\"a\":1}x", "tru", "\"\\uD800\"", "1e999", "-1e400", "\"a\tb\""}) {
+  for (const char* bad : {"", "{", "[1,]", "{\"a\":1}x", "tru", "\"\\uD800\"", "[\"\\udc00\"]", "1e999", "-1e400", "\"a\tb\""}) {
     EXPECT_FALSE(parseJson(bad)) << bad;
   }
   EXPECT_FALSE(parseJson(std::string("\"\xC3\x28\"")));  // invalid UTF-8
   EXPECT_FALSE(parseJson(std::string("\"\xED\xA0\x80\"")));  // an encoded surrogate
+  EXPECT_FALSE(parseJson(std::string_view()));             // no text, not even a pointer to one
 }
 
 TEST(Json, BoundsDepthAndSize) {

@@ -63,6 +63,8 @@ TEST(Unicode, CuttingKeepsWholeCharacters) {
   EXPECT_EQ(suffixFromFirstMatch("xe\u0301y", acute), "e\u0301y");
   // An emoji keycap keeps its base digit, its selector and its keycap mark together.
   EXPECT_EQ(suffixFromFirstMatch("call 1\uFE0F\u20E3", digit), "1\uFE0F\u20E3");
+  // CR LF is one character even though both are ASCII.
+  EXPECT_EQ(suffixFromFirstMatch("a\r\nb", [](char32_t c) { return c == U'\n'; }), "\r\nb");
 }
 
 TEST(Unicode, KeepingCodePointsDropsIllFormedBytes) {

@@ -57,34 +57,45 @@ class AXObject : public platform::Object {
 
 namespace detail {
 
-/// Writes present fields into a dictionary.
+/// Counts a record's fields.
+struct FieldCounter {
+  std::size_t count = 0;
+  template <class T>
+  void operator()(const char* /*key*/, const T& /*v*/) {
+    ++count;
+  }
+};
+
+/// Writes present fields into a dictionary. Each key comes once, so members are appended without
+/// looking for one of the same name.
 struct FieldWriter {
-  Value& out;
+  Value::object_t::Container& out;
 
   void operator()(const char* key, const std::optional<std::string>& v) const {
-    if (v) out[key] = *v;
+    if (v) out.emplace_back(key, *v);
   }
   void operator()(const char* key, const std::optional<double>& v) const {
-    if (v && std::isfinite(*v)) out[key] = *v;  // JSON cannot carry NaN or infinity
+    if (v && std::isfinite(*v)) out.emplace_back(key, *v);  // JSON cannot carry NaN or infinity
   }
   void operator()(const char* key, const std::optional<bool>& v) const {
-    if (v) out[key] = *v;
+    if (v) out.emplace_back(key, *v);
   }
   void operator()(const char* key, const std::optional<std::int64_t>& v) const {
-    if (v) out[key] = *v;
+    if (v) out.emplace_back(key, *v);
   }
   template <class T>
   void operator()(const char* key, const std::shared_ptr<T>& v) const {
-    if (v) out[key] = v->dictionary();
+    if (v) out.emplace_back(key, v->dictionary());
   }
   template <class T>
   void operator()(const char* key, const AXArray<T>& v) const {
     if (!v) return;
     Value array = Value::array();
+    array.get_ref<Value::array_t&>().reserve(v->size());
     for (const auto& item : *v) {
       if (item) array.push_back(item->dictionary());
     }
-    out[key] = std::move(array);
+    out.emplace_back(key, std::move(array));
   }
 };
 
@@ -131,8 +142,14 @@ class AXRecord : public AXObject {
 
   [[nodiscard]] Value dictionary() const override {
     Value out = Value::object();
-    out["class"] = std::string(Derived::kClassName);
-    detail::FieldWriter writer{out};
+    // The storage of an ordered object copies, rather than moves, what it holds each time it
+    // grows (its keys are const): room for every field is made first.
+    auto& members = static_cast<Value::object_t::Container&>(out.get_ref<Value::object_t&>());
+    detail::FieldCounter counter;
+    Derived::fields(static_cast<const Derived&>(*this), counter);
+    members.reserve(1 + counter.count);
+    members.emplace_back("class", std::string(Derived::kClassName));
+    detail::FieldWriter writer{members};
     Derived::fields(static_cast<const Derived&>(*this), writer);
     return out;
   }

@@ -1,6 +1,7 @@
 #include "platform/localization/Localization.h"
 #include "platform/localization/IcuLocalization.h"
 
+#include <unicode/dcfmtsym.h>
 #include <unicode/decimfmt.h>
 #include <unicode/numfmt.h>
 #include <unicode/udata.h>
@@ -8,6 +9,7 @@
 #include <unicode/unistr.h>
 #include <unicode/ures.h>
 
+#include <charconv>
 #include <cstddef>
 #include <cstring>
 #include <new>
@@ -84,6 +86,36 @@ struct IcuNumberFormatting::Impl {
   std::mutex mutex;  // ICU formats are not documented as safe for concurrent use
   std::unique_ptr<icu::NumberFormat> integer;
   std::unique_ptr<icu::NumberFormat> decimal;
+  /// The locale's decimal separator when it is one ASCII character and the locale writes ASCII
+  /// digits; 0 otherwise.
+  char asciiSeparator = 0;
+
+  /// The value of a text of ASCII digits with at most one separator between digits, read without
+  /// ICU; nothing for any other text. Fifteen digits at most, so that the value is the correctly
+  /// rounded double that ICU's reading gives too.
+  [[nodiscard]] std::optional<double> plainDecimal(std::string_view text) const {
+    if (asciiSeparator == 0 || text.empty() || text.size() > 16) return std::nullopt;
+    char buffer[17];
+    std::size_t digits = 0;
+    std::size_t separator = std::string_view::npos;
+    for (std::size_t i = 0; i < text.size(); ++i) {
+      const char c = text[i];
+      if (c >= '0' && c <= '9') {
+        buffer[i] = c;
+        ++digits;
+      } else if (c == asciiSeparator && separator == std::string_view::npos && i > 0 && i + 1 < text.size()) {
+        buffer[i] = '.';
+        separator = i;
+      } else {
+        return std::nullopt;
+      }
+    }
+    if (digits > 15) return std::nullopt;
+    double value = 0;
+    const auto [end, error] = std::from_chars(buffer, buffer + text.size(), value);
+    if (error != std::errc() || end != buffer + text.size()) return std::nullopt;
+    return value;
+  }
 };
 
 IcuNumberFormatting::IcuNumberFormatting(std::optional<std::string> localeId) : impl_(std::make_unique<Impl>()) {
@@ -99,6 +131,16 @@ IcuNumberFormatting::IcuNumberFormatting(std::optional<std::string> localeId) : 
   status = U_ZERO_ERROR;
   impl_->decimal.reset(icu::NumberFormat::createInstance(locale, UNUM_DECIMAL, status));
   if (U_FAILURE(status)) impl_->decimal.reset();
+  if (const auto* format = dynamic_cast<const icu::DecimalFormat*>(impl_->decimal.get())) {
+    const icu::DecimalFormatSymbols* symbols = format->getDecimalFormatSymbols();
+    const icu::UnicodeString& separator = symbols->getConstSymbol(icu::DecimalFormatSymbols::kDecimalSeparatorSymbol);
+    const icu::UnicodeString& zero = symbols->getConstSymbol(icu::DecimalFormatSymbols::kZeroDigitSymbol);
+    const icu::UnicodeString& grouping = symbols->getConstSymbol(icu::DecimalFormatSymbols::kGroupingSeparatorSymbol);
+    if (separator.length() == 1 && separator[0] < 0x80 && (separator[0] < u'0' || separator[0] > u'9') &&
+        zero == icu::UnicodeString(u'0') && separator != grouping) {
+      impl_->asciiSeparator = static_cast<char>(separator[0]);
+    }
+  }
 }
 
 IcuNumberFormatting::~IcuNumberFormatting() = default;
@@ -115,6 +157,8 @@ std::string IcuNumberFormatting::integerText(std::uint64_t value) const {
 
 std::optional<double> IcuNumberFormatting::parseDecimal(std::string_view text) const {
   if (text.empty()) return std::nullopt;
+  // The server's distances are plain digits: read without ICU, which takes microseconds a text.
+  if (auto plain = impl_->plainDecimal(text)) return plain;
   const icu::UnicodeString input = icu::UnicodeString::fromUTF8(icu::StringPiece(text.data(), static_cast<int32_t>(text.size())));
   std::lock_guard lock(impl_->mutex);
   if (!impl_->decimal) return std::nullopt;

@@ -16,7 +16,9 @@ namespace {
 std::optional<std::string> readAndWrite(std::string_view text, std::string_view region, PhoneNumberStyle style);
 
 /// The last results, most recent first. Every command reads its friends' numbers again, and the
-/// parser takes some 20 µs a number, so the few hundred most recent results are kept.
+/// parser takes some 20 µs a number, so the most recent results are kept: enough for the numbers of
+/// a large friends list, each entry about a hundred bytes. A list longer than the cache would miss
+/// on every number, as the least recent one is always the next one read.
 class ResultCache {
  public:
   std::optional<std::optional<std::string>> find(const std::string& key) {
@@ -38,7 +40,7 @@ class ResultCache {
   }
 
  private:
-  static constexpr std::size_t kCapacity = 512;
+  static constexpr std::size_t kCapacity = 8192;
   using Entry = std::pair<std::string, std::optional<std::string>>;
   std::mutex mutex_;
   std::list<Entry> order_;

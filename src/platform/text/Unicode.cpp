@@ -43,6 +43,14 @@ std::optional<std::string> suffixFromFirstMatch(std::string_view text, const std
     index = u.moveIndex32(index, 1);
   }
   if (!found) return std::nullopt;
+  // A match at the start begins a character; so does an ASCII match after an ASCII character,
+  // unless it is the LF of a CR LF (no ASCII character extends or prepends to another). Building a
+  // break iterator costs more than the rest of the call.
+  const UChar before = index > 0 ? u.charAt(index - 1) : 0;
+  const UChar at = u.charAt(index);
+  if (index == 0 || (before < 0x80 && at < 0x80 && !(before == u'\r' && at == u'\n'))) {
+    return toUtf8(u.tempSubString(index));
+  }
   UErrorCode status = U_ZERO_ERROR;
   std::unique_ptr<icu::BreakIterator> clusters(icu::BreakIterator::createCharacterInstance(icu::Locale::getRoot(), status));
   if (U_SUCCESS(status) && clusters) {
