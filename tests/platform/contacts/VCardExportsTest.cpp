@@ -7,20 +7,12 @@
 #include "support/PlatformTest.h"
 
 #include <algorithm>
-#include <fstream>
 #include <sstream>
 
 namespace kyn::platform {
 namespace {
 
 const ContactKeys kKeys = {std::string(ContactKey::FullNameFormatterKeys), std::string(ContactKey::ImageData)};
-
-std::string readAll(const std::filesystem::path& file) {
-  std::ifstream in(file, std::ios::binary);
-  std::ostringstream text;
-  text << in.rdbuf();
-  return text.str();
-}
 
 // Cards as a plain count of BEGIN:VCARD lines (the samples embed no cards in others).
 std::size_t countBeginLines(const std::string& text) {
@@ -71,7 +63,7 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
   std::size_t contacts = 0, named = 0, decodedPhotos = 0;
   for (const auto& file : files) {
     SCOPED_TRACE(file.filename().string());
-    const std::string text = readAll(file);
+    const std::string text = test::readFile(file);
     const VCardParseResult parsed = parseVCards(text, file.filename().string());
     EXPECT_TRUE(parsed.skipped.empty());
     EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
@@ -137,7 +129,7 @@ TEST_F(VCardExports, ByteOrderMarksAndUtf16ChangeNothing) {
                     c.emailAddresses, c.phoneNumbers, c.postalAddresses);
   };
   for (const auto& file : files) {
-    const std::string text = readAll(file);
+    const std::string text = test::readFile(file);
     ASSERT_TRUE(std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; }))
         << file << " is no longer ASCII: asciiAsUtf16 cannot encode it";
     const std::string name = file.filename().string();
