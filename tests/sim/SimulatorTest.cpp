@@ -53,22 +53,6 @@ class ProgramTest : public ::testing::Test {
   int spawned_ = 0;
 };
 
-TEST_F(ProgramTest, ServesUntilSigtermAndExitsCleanly) {
-  writeFileAtomically(dir.path() / "friends.json", kData);
-  auto run = spawn({"--person", kPerson, "--data", (dir.path() / "friends.json").string(), "--port", "0", "--ca-out",
-                    (dir.path() / "ca.pem").string(), "--port-file", (dir.path() / "port").string()});
-  const std::string ready = run->readLine().value_or("");
-  const std::string port = readFile(dir.path() / "port");
-  EXPECT_EQ(ready, "kyn-sim listening on https://127.0.0.1:" + port.substr(0, port.size() - 1));
-
-  auto res = post(dir.path() / "ca.pem", "127.0.0.1", std::stoi(port), kToken);
-  ASSERT_TRUE(res);
-  EXPECT_EQ(res->status, 200);
-
-  EXPECT_EQ(run->stop(), 0);
-  EXPECT_EQ(run->readAll() + errors(), "");
-}
-
 TEST_F(ProgramTest, MoveReachesTheRunningServerThroughItsControlFile) {
   writeFileAtomically(dir.path() / "friends.json", kData);
   const auto control = dir.path() / "control.json";
