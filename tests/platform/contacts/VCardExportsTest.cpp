@@ -42,16 +42,6 @@ std::optional<std::vector<std::filesystem::path>> sampleFiles() {
   return files;
 }
 
-// An ASCII text as UTF-16 with its byte-order mark.
-std::string asciiAsUtf16(std::string_view text, bool bigEndian) {
-  std::string bytes = bigEndian ? "\xFE\xFF" : "\xFF\xFE";
-  for (const char c : text) {
-    bytes += bigEndian ? '\0' : c;
-    bytes += bigEndian ? c : '\0';
-  }
-  return bytes;
-}
-
 using VCardExports = test::PlatformTest;  // keeps the log lines of the loads out of the output
 
 TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
@@ -116,38 +106,6 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
   EXPECT_GT(contacts, files.size() - 1);
   EXPECT_GT(named, contacts / 2);
   EXPECT_GT(decodedPhotos, 0u);
-}
-
-// The same files with a UTF-8 byte-order mark, and as UTF-16 in either byte order, read alike.
-TEST_F(VCardExports, ByteOrderMarksAndUtf16ChangeNothing) {
-  const auto samples = sampleFiles();
-  if (!samples) GTEST_SKIP() << "the shared test data (testdata/vcards beside the project) is not here";
-  const auto& files = *samples;
-  ASSERT_FALSE(files.empty());
-  const auto fields = [](const Contact& c) {
-    return std::tie(c.identifier, c.formattedName, c.givenName, c.familyName, c.organizationName, c.note,
-                    c.emailAddresses, c.phoneNumbers, c.postalAddresses);
-  };
-  for (const auto& file : files) {
-    const std::string text = test::readFile(file);
-    ASSERT_TRUE(std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; }))
-        << file << " is no longer ASCII: asciiAsUtf16 cannot encode it";
-    const std::string name = file.filename().string();
-    const VCardParseResult plain = parseVCards(text, name);
-    const std::pair<const char*, std::string> variants[] = {{"UTF-8 with mark", "\xEF\xBB\xBF" + text},
-                                                            {"UTF-16LE", asciiAsUtf16(text, false)},
-                                                            {"UTF-16BE", asciiAsUtf16(text, true)}};
-    for (const auto& [encoding, variant] : variants) {
-      SCOPED_TRACE(name + " as " + encoding);
-      const VCardParseResult parsed = parseVCards(variant, name);
-      EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
-      ASSERT_EQ(parsed.contacts.size(), plain.contacts.size());
-      for (std::size_t i = 0; i < plain.contacts.size(); ++i) {
-        EXPECT_TRUE(fields(parsed.contacts[i]) == fields(plain.contacts[i])) << plain.contacts[i].identifier;
-        EXPECT_EQ(bool(parsed.contacts[i].imageData), bool(plain.contacts[i].imageData));
-      }
-    }
-  }
 }
 
 }  // namespace
