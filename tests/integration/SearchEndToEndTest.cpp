@@ -283,33 +283,6 @@ TEST_F(SearchEndToEnd, ShuttingDownAnswersACommandInFlight) {
   EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(10));
 }
 
-// The JSONTestSuite texts as get-locations answers: each one ends in exactly one reply, no crash.
-TEST_F(SearchEndToEnd, HostileBodiesEachEndInOneReply) {
-  const auto corpus = test::sharedTestData("json-parsing");
-  if (!corpus) GTEST_SKIP() << "../shared/testdata/json-parsing is not beside the project";
-  const auto body = simDir.path() / "body.json";  // a link to the text under test, never a copy
-  std::filesystem::create_symlink(*corpus / "y_object_empty.json", body);
-  start(kFriends, {"--fault", "body:" + body.string()});
-  std::vector<std::filesystem::path> texts;
-  for (const auto& e : std::filesystem::directory_iterator(*corpus)) {
-    if (e.path().extension() == ".json") texts.push_back(e.path());
-  }
-  std::sort(texts.begin(), texts.end());
-  ASSERT_GE(texts.size(), 300u);
-  for (const auto& text : texts) {
-    std::filesystem::remove(body);
-    std::filesystem::create_symlink(text, body);
-    const auto reply = plugin->performAndWait(searchFor({"ada@example.com"}), std::chrono::seconds(20));
-    ASSERT_TRUE(reply) << text.filename();
-    EXPECT_TRUE((*reply)["class"] == "AXKynSearchCompleted" || (*reply)["class"] == "AXCommandFailed")
-        << text.filename() << ": " << reply->dump();
-  }
-  plugin->shutdown();
-  const auto counts = plugin->replyCounts();
-  EXPECT_TRUE(std::all_of(counts.begin(), counts.end(), [](int n) { return n == 1; }));
-  EXPECT_EQ(sim->requests().size(), texts.size());
-}
-
 }  // namespace
 }  // namespace kyn::itest
 
