@@ -101,7 +101,7 @@ TEST_F(SystemInfoTest, DeviceFacts) {
   configDir->write("product_name", "  \n");
   EXPECT_FALSE(facts.productType());
   configDir->write("os-release", "VERSION_ID=12\n");
-  EXPECT_FALSE(facts.osBuildVersion()->empty());  // the kernel's release instead
+  EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead
   if (auto udid = facts.deviceUDID()) {  // needs a machine id
     EXPECT_EQ(udid->size(), 36u);
     EXPECT_EQ(*udid, facts.deviceUDID());
