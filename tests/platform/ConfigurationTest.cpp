@@ -80,6 +80,17 @@ TEST_F(ConfigurationTest, TimeLimitsBelowAMillisecondRoundUp) {
   EXPECT_EQ(errors(), 0u);
 }
 
+// A host that configures another directory must not keep writing into the first one.
+TEST_F(ConfigurationTest, AnotherDirectoryBringsItsOwnPreferences) {
+  services().preferences.get()->setValue("d", "k", Value("first"));
+  services().preferences.get()->synchronize("d");
+  test::TempDir second;
+  services().configure(second.path());
+  EXPECT_FALSE(services().preferences.get()->value("d", "k"));
+  services().configure(configDir->path());
+  EXPECT_EQ(services().preferences.get()->value("d", "k"), Value("first"));
+}
+
 TEST(ConfigurationDirectory, XdgThenHomeThenTheWorkingDirectory) {
   const auto saved = [](const char* name) -> std::optional<std::string> {
     const char* v = std::getenv(name);
