@@ -18,12 +18,12 @@ ContactRef contactWith(std::string id, bool picture, bool thumbnail = false) {
 
 TEST(OptimalContact, PrefersTheFirstWithAFullPicture) {
   using V = std::vector<ContactRef>;
-  const V onlyThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&onlyThird)->identifier, "c");
+  const V fromThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true), contactWith("d", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&fromThird)->identifier, "c");
   const V none{contactWith("a", false), contactWith("b", false, true), contactWith("c", false)};
   EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&none)->identifier, "a");
-  const V both{contactWith("a", true), contactWith("b", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&both)->identifier, "a");
+  const V second{contactWith("a", false), contactWith("b", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&second)->identifier, "b");
   const V single{contactWith("a", false)};
   EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&single)->identifier, "a");
   const V empty;

@@ -158,6 +158,7 @@ TEST_F(SystemInfoTest, SigningInWritesBothFilesWholeAndSigningOutRemovesThem) {
   EXPECT_FALSE(writeSignIn(dir, {"P-2", "ada@example.com", "https://x", "tok-2"}));
   fs::create_directory(dir / "account.json.new");  // no file can be staged there
   EXPECT_FALSE(writeSignIn(dir, {"P-2", "ada@example.com", "h", "tok-2"}));
+  EXPECT_FALSE(log->messages(LogLevel::Error).empty());  // the log says why
   EXPECT_FALSE(fs::exists(dir / "token.new"));
   EXPECT_EQ(readApplicationToken(dir / "token"), "tok-1");
   EXPECT_EQ(readAccountFile(dir / "account.json")->personId, "P-1");
