@@ -232,6 +232,9 @@ TEST_F(SearchEndToEnd, TheEntryPointsRefuseWhatTheyCannotUse) {
     EXPECT_EQ(lib.friendPicture(notAnObject, nullptr, nullptr, nullptr), nullptr) << notAnObject;
   }
   EXPECT_EQ(lib.describeLocation(nullptr, 1, nullptr), nullptr);
+  std::string deep = "{}";
+  for (int level = 1; level < 65; ++level) deep = "{\"a\":" + deep + "}";  // one level past the limit
+  EXPECT_EQ(lib.describeLocation(deep.c_str(), 1, nullptr), nullptr);
   EXPECT_EQ(lib.findPeople(nullptr), nullptr);
   EXPECT_EQ(lib.findPerson(nullptr), nullptr);
   EXPECT_EQ(lib.signIn(nullptr, "u", "h", "t"), KYN_SIGN_IN_BAD_PERSON_ID);
