@@ -8,7 +8,6 @@
 #include <algorithm>
 #include <fstream>
 #include <map>
-#include <thread>
 
 namespace kyn::itest {
 namespace {
@@ -245,36 +244,6 @@ TEST_F(SearchEndToEnd, TheEntryPointsRefuseWhatTheyCannotUse) {
   EXPECT_TRUE(sim->requests().empty());
   // The refused configure left the plug-in as it was: the next command still reaches the server.
   EXPECT_EQ((*plugin->perform(searchFor({"ada@example.com"})).reply)["class"], "AXKynSearchCompleted");
-}
-
-// Host threads may call perform at once (the thread sanitizer build watches this one): every
-// command gets exactly its own one reply.
-TEST_F(SearchEndToEnd, SeveralHostThreadsPerformAtOnce) {
-  start();
-  constexpr int kThreads = 4, kEach = 3;
-  std::vector<std::unique_ptr<host::Reply>> boxes;
-  for (int i = 0; i < kThreads * kEach; ++i) boxes.push_back(std::make_unique<host::Reply>());
-  std::vector<std::thread> hosts;
-  for (int t = 0; t < kThreads; ++t) {
-    hosts.emplace_back([&, t] {
-      for (int i = 0; i < kEach; ++i) {
-        // Every third command fails validation and is answered inside the call.
-        const std::string command = i == 2 ? R"({"class":"AXKynSearch"})" : searchFor({"ada@example.com"});
-        EXPECT_EQ(plugin->library().perform(command.c_str(), &host::Reply::receive, boxes[t * kEach + i].get()), 0);
-      }
-    });
-  }
-  for (auto& h : hosts) h.join();
-  for (int i = 0; i < kThreads * kEach; ++i) {
-    const auto reply = boxes[i]->wait(std::chrono::seconds(30));
-    ASSERT_TRUE(reply) << i;
-    const Json json = Json::parse(*reply);
-    if (i % kEach == 2) EXPECT_EQ(json["class"], "AXCommandFailed") << i;
-    else EXPECT_EQ(json["kynLocations"][0]["label"], "Work") << i << ": " << *reply;
-  }
-  plugin->shutdown();
-  for (const auto& box : boxes) EXPECT_EQ(box->count(), 1);
-  EXPECT_EQ(sim->requests().size(), static_cast<std::size_t>(kThreads * (kEach - 1)));
 }
 
 TEST_F(SearchEndToEnd, ShuttingDownAnswersACommandInFlight) {
