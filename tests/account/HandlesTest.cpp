@@ -1,30 +1,33 @@
 #include "account/Common.h"
-#include "support/ContactsTest.h"
 #include "platform/locale/IcuLocaleInfo.h"
+#include "support/PlatformTest.h"
 
 namespace kyn {
 namespace {
 
 using platform::services;
 
-class HandlesTest : public test::ContactsTest {
+class HandlesTest : public test::PlatformTest {
  protected:
   Common common;
 };
 
 TEST_F(HandlesTest, OnlyLeadingJunkIsCutBeforeParsing) {
-  EXPECT_EQ(common.completeNumberForPhoneNumber("Mobile: +1 (408) 555-0100"), "+14085550100");
-  EXPECT_EQ(common.completeNumberForPhoneNumber("(408) 555-0100"), "+14085550100");
-  EXPECT_EQ(common.completeNumberForPhoneNumber("ext. 12"), "12");  // cut, and too short to be a number
-  EXPECT_EQ(common.completeNumberForPhoneNumber("ext. x"), "ext. x");  // nothing to cut, no number
-  EXPECT_EQ(common.completeNumberForPhoneNumber("Ada Lovelace"), "Ada Lovelace");
-  EXPECT_EQ(common.completeNumberForPhoneNumber("tel \u0664\u0660\u0668\u0665\u0665\u0665\u0660\u0661\u0660\u0660"),
-            "+14085550100");
-}
-
-TEST_F(HandlesTest, EmptyAndAbsentNumbers) {
-  EXPECT_EQ(common.completeNumberForPhoneNumber(""), "");
-  EXPECT_EQ(common.completeNumberForPhoneNumber(std::nullopt), std::nullopt);
+  const std::pair<std::optional<std::string>, std::optional<std::string>> cases[] = {
+      {"Mobile: +1 (408) 555-0100", "+14085550100"},
+      {"(408) 555-0100", "+14085550100"},
+      {"ext. 12", "12"},              // cut, and too short to be a number
+      {"ext. x", "ext. x"},           // nothing to cut, no number
+      {"Ada Lovelace", "Ada Lovelace"},
+      {"tel \u0664\u0660\u0668\u0665\u0665\u0665\u0660\u0661\u0660\u0660", "+14085550100"},
+      {"", ""},
+      {std::nullopt, std::nullopt},
+  };
+  for (const auto& [raw, completed] : cases) EXPECT_EQ(common.completeNumberForPhoneNumber(raw), completed) << raw.value_or("(none)");
+  // Each phone character ends the junk: what stands before it goes, the character stays.
+  for (const char* first : {"+", "(", ")", "*", "#", "-"}) {
+    EXPECT_EQ(common.completeNumberForPhoneNumber(std::string("abc ") + first + "x"), std::string(first) + "x") << first;
+  }
 }
 
 TEST_F(HandlesTest, TheLocalesCountryReadsNationalNumbers) {
@@ -37,13 +40,16 @@ TEST_F(HandlesTest, TheLocalesCountryReadsNationalNumbers) {
 }
 
 TEST_F(HandlesTest, PhonesFirstThenEmailsWithDuplicatesKept) {
-  const auto p = test::makePerson({"ada@example.com"}, {"(503) 555-0101", "503.555.0101"});
+  const auto p = test::makePerson({"ada@example.com", std::nullopt}, {"(503) 555-0101", "503.555.0101"});
   EXPECT_EQ(common.handlesForAXPerson(*p),
             (std::vector<std::string>{"+15035550101", "+15035550101", "ada@example.com"}));
+  EXPECT_TRUE(common.handlesForAXPerson(AXPerson{}).empty());
+  EXPECT_TRUE(common.isHandleEmail("@@not really"));
+  EXPECT_FALSE(common.isHandleEmail("+14085550100"));
 }
 
 TEST_F(HandlesTest, WithoutPhonesOfItsOwnThePersonsContactLendsItsNumbers) {
-  auto& contact = store->add("ada-1");
+  auto& contact = addressBook->add("ada-1");
   contact.phoneNumbers = {{"mobile", "(503) 555-0101"}, {"work", "+44 20 7946 0018"}};
   auto p = test::makePerson({"Ada@Example.com"}, {});
   p->identifier = platform::assistantIdentifierForContactIdentifier("ada-1");
@@ -57,11 +63,6 @@ TEST_F(HandlesTest, WithoutPhonesOfItsOwnThePersonsContactLendsItsNumbers) {
   auto r = test::makePerson({}, {"+1 503 555 0199"});
   r->identifier = p->identifier;
   EXPECT_EQ(common.handlesForAXPerson(*r), (std::vector<std::string>{"+15035550199"}));
-}
-
-TEST_F(HandlesTest, APersonWithNothingHasNoHandles) {
-  EXPECT_TRUE(common.handlesForAXPerson(AXPerson{}).empty());
-  EXPECT_TRUE(common.handlesForAXPerson(*test::makePerson({std::nullopt}, {})).empty());  // address-less entry skipped
 }
 
 }  // namespace

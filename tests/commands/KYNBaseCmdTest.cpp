@@ -5,104 +5,56 @@
 namespace kyn {
 namespace {
 
-using platform::services;
+class KYNBaseCmdTest : public test::PlatformTest {};
 
-class KYNBaseCmdTest : public test::PlatformTest {
- protected:
-  void SetUp() override {
-    PlatformTest::SetUp();
-    systemInfo->signIn("P-1001", "secret-token-42", "kyn.example.test");
-  }
-  static void storeRedirect(const std::string& host) {
-    auto command = std::make_shared<platform::KYJSONCommand>();
-    command->setRedirect("kyn.example.test", host);
-    services().notificationCenter().post({std::string(platform::KYCommandRedirectedNotification), command});
-  }
-};
-
-TEST_F(KYNBaseCmdTest, TakesSchemeCredentialsAndHostFromTheAccount) {
+TEST_F(KYNBaseCmdTest, TakesSchemeCredentialsAndHostFromTheAccountUnlessARedirectIsStored) {
   KYNBaseCmd command;
-  EXPECT_EQ(command.scheme(), "https");
+  EXPECT_EQ(command.url(), "https://kyn.example.test/");
   EXPECT_EQ(command.username(), "P-1001");
   EXPECT_EQ(command.password(), "secret-token-42");
-  EXPECT_EQ(command.host(), "kyn.example.test");
-}
-
-TEST_F(KYNBaseCmdTest, AStoredRedirectWinsUntilItIsFlushed) {
-  storeRedirect("p07-kyn.example.test");
+  test::postRedirect("kyn.example.test", "p07-kyn.example.test");
   EXPECT_EQ(KYNBaseCmd().host(), "p07-kyn.example.test");
   EXPECT_EQ(KYNBaseCmd().host(), "p07-kyn.example.test");
   Common::sharedInstance().flushRedirection();
   EXPECT_EQ(KYNBaseCmd().host(), "kyn.example.test");
-}
 
-TEST_F(KYNBaseCmdTest, WithoutAccountOrRedirectTheHostStaysUnset) {
   systemInfo->signOut();
   Common::sharedInstance().clearKYNAccount();
-  KYNBaseCmd command;
-  EXPECT_FALSE(command.host());
-  EXPECT_FALSE(command.username());
-  EXPECT_FALSE(command.password());
-  EXPECT_FALSE(command.url());
+  KYNBaseCmd nobody;
+  EXPECT_FALSE(nobody.host() || nobody.username() || nobody.password() || nobody.url());
 }
 
-TEST_F(KYNBaseCmdTest, AddsTheTwoFixedHeadersInOrder) {
-  const Value headers = KYNBaseCmd().headers();
-  EXPECT_EQ(platform::toJson(headers), R"({"X-Zanto-Vorn-API-Ver":"4.0","X-Zanto-AuthScheme":"Forever"})");
-}
-
-TEST_F(KYNBaseCmdTest, TheBodyCarriesTheSharedClientContext) {
-  const Value body = KYNBaseCmd().jsonBodyDictionary();
-  ASSERT_TRUE(body.contains("clientContext"));
-  EXPECT_EQ(body["clientContext"], KYNBaseCmd::staticClientContext());
-  EXPECT_EQ(body.size(), 1u);
-}
-
-TEST_F(KYNBaseCmdTest, ClientContextHasTheDeviceFactsInOrder) {
-  const Value context = KYNBaseCmd::makeClientContext();
-  EXPECT_EQ(platform::toJson(context),
+TEST_F(KYNBaseCmdTest, TheTwoFixedHeadersAndTheSharedClientContext) {
+  EXPECT_EQ(platform::toJson(KYNBaseCmd().headers()), R"({"X-Zanto-Vorn-API-Ver":"4.0","X-Zanto-AuthScheme":"Forever"})");
+  EXPECT_EQ(KYNBaseCmd().jsonBodyDictionary(), (Value{{"clientContext", KYNBaseCmd::staticClientContext()}}));
+  EXPECT_EQ(platform::toJson(KYNBaseCmd::makeClientContext()),
             R"({"deviceUDID":"0F8A2C4E-1B3D-4F5A-9C7E-2D4B6F8A0C1E","productType":"Test Desktop 1",)"
             R"("osVersion":"12.4","buildVersion":"6.1.0-test","locale":"en-US"})");
-}
-
-TEST_F(KYNBaseCmdTest, UnknownFactsAreLeftOutNotSentAsNull) {
   systemInfo->product.reset();
   assistant->setLanguageCode(std::nullopt);
-  const Value context = KYNBaseCmd::makeClientContext();
-  EXPECT_FALSE(context.contains("productType"));
-  EXPECT_FALSE(context.contains("locale"));
-  EXPECT_EQ(context.size(), 3u);
+  EXPECT_EQ(platform::toJson(KYNBaseCmd::makeClientContext()),  // unknown facts are left out, not sent as null
+            R"({"deviceUDID":"0F8A2C4E-1B3D-4F5A-9C7E-2D4B6F8A0C1E","osVersion":"12.4","buildVersion":"6.1.0-test"})");
 }
 
 TEST_F(KYNBaseCmdTest, TheClientContextIsBuiltOnce) {
   const Value first = KYNBaseCmd().jsonBodyDictionary()["clientContext"];
   assistant->setLanguageCode("de-DE");
   systemInfo->udid = "changed";
-  const Value second = KYNBaseCmd().jsonBodyDictionary()["clientContext"];
-  EXPECT_EQ(first, second);
-  EXPECT_EQ(&KYNBaseCmd::staticClientContext(), &KYNBaseCmd::staticClientContext());
+  EXPECT_EQ(KYNBaseCmd().jsonBodyDictionary()["clientContext"], first);
 }
 
 TEST_F(KYNBaseCmdTest, EveryParseSetsTheStatusCodeAsItCame) {
   KYNBaseCmd command;
   EXPECT_FALSE(command.statusCode());
-  command.setResponseBody(R"({"statusCode":200})");
-  ASSERT_NE(command.jsonResponseDictionary(), nullptr);
-  EXPECT_EQ(command.statusCode(), Value(200));
-  command.setResponseBody(R"({"other":1})");
-  (void)command.jsonResponseDictionary();
-  EXPECT_FALSE(command.statusCode());  // cleared by a response without it
-  command.setResponseBody(R"({"statusCode":"417"})");
-  (void)command.jsonResponseDictionary();
-  EXPECT_EQ(command.statusCode(), Value("417"));
-  command.setResponseBody(R"({"statusCode":null})");
-  (void)command.jsonResponseDictionary();
-  EXPECT_FALSE(command.statusCode());
-  command.setResponseBody("not json");
-  EXPECT_EQ(command.jsonResponseDictionary(), nullptr);
-  EXPECT_FALSE(command.statusCode());
-  command.setResponseBody("[1,2]");
-  EXPECT_EQ(command.jsonResponseDictionary(), nullptr);
+  const std::pair<const char*, std::optional<Value>> bodies[] = {
+      {R"({"statusCode":200})", Value(200)}, {R"({"other":1})", std::nullopt},  // cleared by a response without it
+      {R"({"statusCode":"417"})", Value("417")}, {R"({"statusCode":null})", std::nullopt},
+      {"not json", std::nullopt}, {"[1,2]", std::nullopt}};
+  for (const auto& [body, status] : bodies) {
+    command.setResponseBody(body);
+    EXPECT_EQ(command.jsonResponseDictionary() != nullptr, body[0] == '{') << body;
+    EXPECT_EQ(command.statusCode(), status) << body;
+  }
 }
 
 TEST_F(KYNBaseCmdTest, MinimumCallbackIntervalIsInSeconds) {
@@ -110,12 +62,11 @@ TEST_F(KYNBaseCmdTest, MinimumCallbackIntervalIsInSeconds) {
   EXPECT_EQ(command.minCallbackInterval(), 0.0);
   command.setResponseBody(R"({"serverContext":{"minCallbackIntervalInMS":5000}})");
   EXPECT_EQ(command.minCallbackInterval(), 5.0);
-  command.setResponseBody(R"({"serverContext":{}})");
-  EXPECT_EQ(command.minCallbackInterval(), 0.0);
-  command.setResponseBody(R"({"serverContext":{"minCallbackIntervalInMS":"5000"}})");
-  EXPECT_EQ(command.minCallbackInterval(), 0.0);
-  command.setResponseBody(R"({"serverContext":"x"})");
-  EXPECT_EQ(command.minCallbackInterval(), 0.0);
+  for (const char* body : {R"({"serverContext":{}})", R"({"serverContext":{"minCallbackIntervalInMS":"5000"}})",
+                           R"({"serverContext":"x"})"}) {
+    command.setResponseBody(body);
+    EXPECT_EQ(command.minCallbackInterval(), 0.0) << body;
+  }
 }
 
 TEST_F(KYNBaseCmdTest, TheDescriptionNeverShowsTheToken) {

@@ -1,15 +1,11 @@
 #include "commands/SetGeoFenceCmd.h"
-#include "support/ContactsTest.h"
+#include "support/PlatformTest.h"
 
 namespace kyn {
 namespace {
 
-class SetGeoFenceCmdTest : public test::ContactsTest {
+class SetGeoFenceCmdTest : public test::PlatformTest {
  protected:
-  void SetUp() override {
-    ContactsTest::SetUp();
-    systemInfo->signIn();
-  }
   /// Ada's office: a full address and a coordinate.
   static std::shared_ptr<AXLocation> office() {
     auto place = std::make_shared<AXLocation>();

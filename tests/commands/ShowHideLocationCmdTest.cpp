@@ -1,17 +1,11 @@
 #include "commands/ShowHideLocationCmd.h"
-#include "support/ContactsTest.h"
+#include "support/PlatformTest.h"
 #include "utils/KYNAXUtils.h"
 
 namespace kyn {
 namespace {
 
-class ShowHideLocationCmdTest : public test::ContactsTest {
- protected:
-  void SetUp() override {
-    ContactsTest::SetUp();
-    systemInfo->signIn();
-  }
-};
+using ShowHideLocationCmdTest = test::PlatformTest;
 
 TEST_F(ShowHideLocationCmdTest, TheBodyIsTheClientContextAndTheOneFlag) {
   ShowHideLocationCmd command;
@@ -21,8 +15,7 @@ TEST_F(ShowHideLocationCmdTest, TheBodyIsTheClientContextAndTheOneFlag) {
   const Value expected = {{"clientContext", KYNBaseCmd::staticClientContext()}, {"prefs", {{"hideLocation", "Yes"}}}};
   EXPECT_EQ(command.jsonBodyDictionary().dump(), expected.dump());
 
-  platform::Location here;
-  here.coordinate = {45.5, -122.6};
+  const auto here = test::fix(45.5, -122.6);
   command.currentLocation = std::make_shared<const platform::Location>(here);
   command.hideLocation = false;
   const Value body = command.jsonBodyDictionary();

@@ -1,22 +1,12 @@
 #include "contacts/ContactsUtilities.h"
-#include "support/FakeContactStore.h"
 #include "support/PlatformTest.h"
 
 namespace kyn {
 namespace {
 
-using platform::services;
 using ContactRef = ContactsUtilities::ContactRef;
 
-class ContactsUtilitiesTest : public test::PlatformTest {
- protected:
-  void SetUp() override {
-    PlatformTest::SetUp();
-    store = std::make_shared<test::FakeContactStore>();
-    services().contactStore.set(store);
-  }
-  std::shared_ptr<test::FakeContactStore> store;
-};
+using ContactsUtilitiesTest = test::PlatformTest;
 
 ContactRef contactWith(std::string id, bool picture, bool thumbnail = false) {
   auto c = std::make_shared<platform::Contact>();
@@ -28,12 +18,12 @@ ContactRef contactWith(std::string id, bool picture, bool thumbnail = false) {
 
 TEST(OptimalContact, PrefersTheFirstWithAFullPicture) {
   using V = std::vector<ContactRef>;
-  const V onlyThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&onlyThird)->identifier, "c");
+  const V fromThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true), contactWith("d", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&fromThird)->identifier, "c");
   const V none{contactWith("a", false), contactWith("b", false, true), contactWith("c", false)};
   EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&none)->identifier, "a");
-  const V both{contactWith("a", true), contactWith("b", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&both)->identifier, "a");
+  const V second{contactWith("a", false), contactWith("b", true)};
+  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&second)->identifier, "b");
   const V single{contactWith("a", false)};
   EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&single)->identifier, "a");
   const V empty;
@@ -48,11 +38,11 @@ TEST_F(ContactsUtilitiesTest, EmptyOrAbsentTextsNeverReachTheStore) {
   EXPECT_FALSE(ContactsUtilities::contactForPhone(std::nullopt));
   EXPECT_FALSE(ContactsUtilities::contactForAssistantId(std::nullopt));
   EXPECT_FALSE(ContactsUtilities::contactForAssistantId("https://example.com/not-ours"));
-  EXPECT_EQ(store->queries, 0);
+  EXPECT_EQ(addressBook->queries, 0);
 }
 
 TEST_F(ContactsUtilitiesTest, FindsByEmailPhoneAndAssistantIdentifierFetchingTheKeyList) {
-  auto& ada = store->add("ada-1");
+  auto& ada = addressBook->add("ada-1");
   ada.givenName = "Ada";
   ada.emailAddresses = {{"home", "Ada@Example.com"}};
   ada.phoneNumbers = {{"mobile", "(503) 555-0101"}};
@@ -62,27 +52,19 @@ TEST_F(ContactsUtilitiesTest, FindsByEmailPhoneAndAssistantIdentifierFetchingThe
                 ->identifier,
             "ada-1");
   EXPECT_FALSE(ContactsUtilities::contactForAssistantId(platform::assistantIdentifierForContactIdentifier("nobody")));
-  EXPECT_EQ(store->lastKeys, ContactsUtilities::contactKeys());
+  EXPECT_EQ(addressBook->lastKeys, ContactsUtilities::contactKeys());
   EXPECT_FALSE(ContactsUtilities::contactForEmail("grace@example.com"));
 }
 
 TEST_F(ContactsUtilitiesTest, OfSeveralMatchesTheOneWithAPictureIsChosen) {
-  store->add("first").emailAddresses = {{std::nullopt, "shared@example.com"}};
-  auto& second = store->add("second");
+  addressBook->add("first").emailAddresses = {{std::nullopt, "shared@example.com"}};
+  auto& second = addressBook->add("second");
   second.emailAddresses = {{std::nullopt, "shared@example.com"}};
   second.thumbnailImageData = test::tinyPicture();  // a thumbnail is no picture
-  auto& third = store->add("third");
+  auto& third = addressBook->add("third");
   third.emailAddresses = {{std::nullopt, "shared@example.com"}};
   third.imageData = test::tinyPicture();
   EXPECT_EQ(ContactsUtilities::contactForEmail("shared@example.com")->identifier, "third");
-}
-
-TEST_F(ContactsUtilitiesTest, WithoutAStoreNothingIsFound) {
-  services().contactStore.set(nullptr);
-  services().contactStore.set(nullptr);
-  EXPECT_FALSE(ContactsUtilities::contactForEmail("ada@example.com"));
-  EXPECT_FALSE(ContactsUtilities::contactForPhone("+15035550101"));
-  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(platform::assistantIdentifierForContactIdentifier("x")));
 }
 
 TEST(ContactKeys, ThirtyInTheirFixedOrder) {

@@ -1,106 +1,168 @@
 #include "commands/GetLocationsCmd.h"
+#include "commands/SetGeoFenceCmd.h"
+#include "commands/ShowHideLocationCmd.h"
 #include "datasource/KYNAXDataSource.h"
 #include "datasource/ReplyCallback.h"
-#include "support/ControllerTest.h"
+#include "support/PlatformTest.h"
 
 namespace kyn {
 namespace {
 
-class KYNAXDataSourceTest : public test::ControllerTest {
- protected:
-  void SetUp() override {
-    ControllerTest::SetUp();
-    systemInfo->signIn();
-  }
+using Send = std::function<void(AXCompletion)>;
 
-  /// Runs a search whose exchange ends with `response`; returns the reply and the command sent.
-  std::pair<Value, std::shared_ptr<GetLocationsCmd>> searchEndingWith(const test::FakeResponse& response) {
-    AXKynSearch search;
-    search.proximity = "near";
+class KYNAXDataSourceTest : public test::PlatformTest {
+ protected:
+  /// Sends with `send`, ends the exchange with `response`; returns the one reply and the command.
+  template <class Command>
+  std::pair<Value, std::shared_ptr<Command>> exchange(const Send& send, const test::FakeResponse& response) {
     std::vector<Value> replies;
-    const std::size_t before = controller->sent().size();
-    KYNAXDataSource::dataSource().search(search, [&](const Value& reply) { replies.push_back(reply); });
-    auto sent = controller->sent();
-    EXPECT_EQ(sent.size(), before + 1);
-    auto command = std::dynamic_pointer_cast<GetLocationsCmd>(sent.back());
-    EXPECT_TRUE(replies.empty());  // nothing before the exchange ends
+    send([&](const Value& reply) { replies.push_back(reply); });
+    auto command = std::dynamic_pointer_cast<Command>(controller->sent().back());
+    EXPECT_TRUE(command && replies.empty());  // nothing before the exchange ends
     test::completeCommand(command, response);
     EXPECT_EQ(replies.size(), 1u);
     EXPECT_FALSE(command->completionBlock()) << "the callback must break the cycle";
     return {replies.empty() ? Value() : replies.front(), command};
   }
+
+  Send search = [](AXCompletion c) { KYNAXDataSource::dataSource().search(AXKynSearch{}, std::move(c)); };
+  Send visibility = [](AXCompletion c) {
+    AXKynVisibilityStateSet command;
+    command.visible = true;
+    KYNAXDataSource::dataSource().setVisibility(command, std::move(c));
+  };
+  Send geoFence = [](AXCompletion c) {
+    AXKynGeoFenceSet command;
+    command.friend_ = test::makePerson({"ada@example.com"}, {});
+    KYNAXDataSource::dataSource().setGeoFence(command, std::move(c));
+  };
 };
 
-TEST_F(KYNAXDataSourceTest, OneSharedInstanceWithAController) {
-  EXPECT_EQ(&KYNAXDataSource::dataSource(), &KYNAXDataSource::dataSource());
-  KYNAXDataSource fresh;
-  EXPECT_TRUE(fresh.serverInteractionController());
+// The three mappings deliberately differ. A row names the error code of each, or 0 for completed.
+TEST_F(KYNAXDataSourceTest, EachOutcomeMapsToOneReplyPerCommand) {
+  constexpr std::int64_t kDone = 0, kNotAvailable = AXKynServiceNotAvailableErrorCode;
+  constexpr std::int64_t kNotCreated = AXKynGeoFenceNotCreatedErrorCode;
+  const struct {
+    test::FakeResponse response;
+    std::int64_t search, visibility, geoFence;
+  } rows[] = {
+      {{false, 401, R"({"statusCode":200})"}, AXKynNotLoggedInErrorCode, kNotAvailable, kDone},
+      {{false, 500, R"({"statusCode":417})"}, kNotAvailable, kNotAvailable, AXKynNoFriendsErrorCode},
+      {{false, std::nullopt, ""}, kNotAvailable, kNotAvailable, kNotAvailable},
+      {{true, 200, R"({"statusCode":411})"}, AXKynNotAFriendErrorCode, kDone, AXKynNotAFriendErrorCode},
+      {{true, 200, R"({"statusCode":"417"})"}, AXKynNoFriendsErrorCode, kDone, AXKynNoFriendsErrorCode},
+      {{true, 200, R"({"statusCode":200})"}, kDone, kDone, kDone},
+      {{true, 200, R"({"locations":{}})"}, kDone, kNotAvailable, kNotAvailable},
+      {{true, 200, R"({"statusCode":0})"}, kDone, kNotAvailable, kNotAvailable},
+      {{true, 200, R"({"statusCode":-1})"}, kDone, kNotAvailable, kNotAvailable},
+      {{true, 200, "<html>"}, kDone, kNotAvailable, kNotAvailable},
+      {{true, 200, R"({"statusCode":401})"}, kDone, kDone, AXKynNotLoggedInErrorCode},
+      {{true, 200, R"({"statusCode":416})"}, kDone, kDone, kNotAvailable},
+      {{true, 200, R"({"statusCode":500})"}, kDone, kDone, kNotCreated},
+      {{true, 200, R"({"statusCode":521})"}, kDone, kDone, AXKynLabelNotFoundErrorCode},
+      {{true, 200, R"({"statusCode":535})"}, kDone, kDone, AXKynAddressNotFoundErrorCode},
+      {{true, 200, R"({"statusCode":540})"}, kDone, kDone, kNotAvailable},
+      {{true, 200, R"({"statusCode":541})"}, kDone, kDone, kNotCreated},
+      {{true, 200, R"({"statusCode":544})"}, kDone, kDone, kNotCreated},
+      {{true, 200, R"({"statusCode":545})"}, kDone, kDone, kNotAvailable},
+      {{true, 200, R"({"statusCode":199})"}, kDone, kDone, kNotAvailable},
+      {{true, 200, R"({"statusCode":299})"}, kDone, kDone, kDone},
+      {{true, 200, R"({"statusCode":300})"}, kDone, kDone, kNotAvailable},
+  };
+  const std::pair<const char*, std::string> completed[] = {
+      {"search", "AXKynSearchCompleted"}, {"visibility", "AXKynVisibilitySetCompleted"}, {"geofence", "AXKynGeoFenceSetCompleted"}};
+  for (const auto& row : rows) {
+    const std::int64_t expected[] = {row.search, row.visibility, row.geoFence};
+    const Value replies[] = {exchange<GetLocationsCmd>(search, row.response).first,
+                             exchange<ShowHideLocationCmd>(visibility, row.response).first,
+                             exchange<SetGeoFenceCmd>(geoFence, row.response).first};
+    for (int i = 0; i < 3; ++i) {
+      SCOPED_TRACE(std::string(completed[i].first) + " " + row.response.body + " " +
+                   std::to_string(row.response.http.value_or(0)));
+      if (expected[i] == kDone) {
+        EXPECT_EQ(replies[i]["class"], completed[i].second);
+      } else {
+        EXPECT_EQ(replies[i], (Value{{"class", "AXCommandFailed"}, {"errorCode", expected[i]}}));
+      }
+    }
+  }
 }
 
-TEST_F(KYNAXDataSourceTest, TheCommandIsFilledFromTheSearch) {
-  AXKynSearch search;
-  search.currentLocation = std::make_shared<AXLocation>();
-  search.currentLocation->latitude = 45.5;
-  search.currentLocation->longitude = -122.6;
-  search.requestedLocation = std::make_shared<AXLocation>();
-  search.requestedLocation->latitude = 45.6;
-  search.requestedLocation->longitude = -122.7;
-  search.requestedLocation->label = "Work";
-  search.friends = std::vector{std::make_shared<AXPerson>()};
-  search.proximity = "at";
-  KYNAXDataSource::dataSource().search(search, [](const Value&) {});
-  auto command = std::dynamic_pointer_cast<GetLocationsCmd>(controller->sent().at(0));
-  ASSERT_TRUE(command);
-  EXPECT_EQ(command->currentLocation->coordinate.latitude, 45.5);
-  EXPECT_EQ(command->requestedLocation->coordinate.longitude, -122.7);
-  EXPECT_EQ(command->requestedLocationLabel, "Work");
-  EXPECT_EQ(command->friends->size(), 1u);
-  EXPECT_EQ(command->proximity, "at");
-  search.friends->clear();  // the command holds its own copy of the list
-  EXPECT_EQ(command->friends->size(), 1u);
-  test::completeCommand(command, {});
+TEST_F(KYNAXDataSourceTest, ACompletedReplyCarriesTheResultAndTheContext) {
+  const Value found = exchange<GetLocationsCmd>(
+      search, {true, 200, R"({"locations":{"a@example.com":{"match":true}},"serverContext":{"clientId":"c"}})"}).first;
+  EXPECT_EQ(found["kynLocations"].size(), 1u);
+  EXPECT_EQ(found["atRequestedLocation"], true);
+  EXPECT_EQ(found["searchContext"], "kynServerContext://serverContext?clientId=c&");
+  const auto shown = exchange<ShowHideLocationCmd>(visibility, {true, 200, R"({"statusCode":500,"serverContext":{"c":"1"}})"});
+  EXPECT_EQ(shown.first, Value::parse(R"({"class":"AXKynVisibilitySetCompleted",
+                                          "searchContext":"kynServerContext://serverContext?c=1&"})"));
+  const auto fence = exchange<SetGeoFenceCmd>(geoFence, {true, 200, R"({"statusCode":200,"serverContext":{"c":"2"},
+                                                                        "fence":{"latitude":45.5}})"});
+  EXPECT_EQ(fence.first["searchContext"], "kynServerContext://serverContext?c=2&");
+  EXPECT_EQ(fence.first["geoFence"]["location"]["latitude"], 45.5);
+  EXPECT_EQ(fence.first["geoFence"]["friend"]["data"], "ada@example.com");
 }
 
-TEST_F(KYNAXDataSourceTest, ABodyWithoutStatusIsACompletedSearch) {
-  auto [reply, command] = searchEndingWith({true, 200, R"({"locations":{"a@example.com":{"match":true}},
-                                                          "serverContext":{"clientId":"c"}})"});
-  EXPECT_EQ(reply["class"], "AXKynSearchCompleted");
-  EXPECT_EQ(reply["kynLocations"].size(), 1u);
-  EXPECT_EQ(reply["atRequestedLocation"], true);
-  EXPECT_EQ(reply["searchContext"], "kynServerContext://serverContext?clientId=c&");
-  EXPECT_TRUE(log->contains("Result: (<AXKynLocation"));
-}
+TEST_F(KYNAXDataSourceTest, TheServerCommandsAreFilledFromTheAssistantsCommands) {
+  AXKynSearch find;
+  find.currentLocation = std::make_shared<AXLocation>();
+  find.currentLocation->latitude = 45.5;
+  find.currentLocation->longitude = -122.6;
+  find.requestedLocation = std::make_shared<AXLocation>();
+  find.requestedLocation->latitude = 45.6;
+  find.requestedLocation->longitude = -122.7;
+  find.requestedLocation->label = "Work";
+  find.friends = std::vector{std::make_shared<AXPerson>()};
+  find.proximity = "at";
+  KYNAXDataSource::dataSource().search(find, [](const Value&) {});
+  auto located = std::dynamic_pointer_cast<GetLocationsCmd>(controller->sent().back());
+  EXPECT_EQ(located->currentLocation->coordinate.latitude, 45.5);
+  EXPECT_EQ(located->requestedLocation->coordinate.longitude, -122.7);
+  EXPECT_EQ(located->requestedLocationLabel, "Work");
+  EXPECT_EQ(located->proximity, "at");
+  find.friends->clear();  // the command holds its own copy of the list
+  EXPECT_EQ(located->friends->size(), 1u);
 
-TEST_F(KYNAXDataSourceTest, BodyStatusesOfAFinishedTransfer) {
-  EXPECT_EQ(searchEndingWith({true, 200, R"({"statusCode":417})"}).first["errorCode"], AXKynNoFriendsErrorCode);
-  EXPECT_EQ(searchEndingWith({true, 200, R"({"statusCode":"411"})"}).first["errorCode"], AXKynNotAFriendErrorCode);
-  EXPECT_EQ(searchEndingWith({true, 200, R"({"statusCode":416,"locations":{}})"}).first["class"], "AXKynSearchCompleted");
-  EXPECT_EQ(searchEndingWith({true, 200, R"({"statusCode":500})"}).first["class"], "AXKynSearchCompleted");
-  EXPECT_EQ(searchEndingWith({true, 200, "not json"}).first["class"], "AXKynSearchCompleted");
-}
+  for (const bool visible : {true, false}) {
+    AXKynVisibilityStateSet show;
+    show.visible = visible;
+    KYNAXDataSource::dataSource().setVisibility(show, [](const Value&) {});
+    EXPECT_EQ(std::dynamic_pointer_cast<ShowHideLocationCmd>(controller->sent().back())->hideLocation, !visible);
+  }
 
-TEST_F(KYNAXDataSourceTest, AFailedTransferIsNotLoggedInOnlyFor401) {
-  EXPECT_EQ(searchEndingWith({false, 401, "{}"}).first["errorCode"], AXKynNotLoggedInErrorCode);
-  EXPECT_TRUE(log->contains("ERROR: Server HTTP Status: 401"));
-  EXPECT_TRUE(log->contains("Error code response: 1001"));
-  EXPECT_EQ(searchEndingWith({false, 500, R"({"statusCode":417})"}).first["errorCode"],
-            AXKynServiceNotAvailableErrorCode);
-  EXPECT_EQ(searchEndingWith({false, std::nullopt, ""}).first["errorCode"], AXKynServiceNotAvailableErrorCode);
-  EXPECT_TRUE(log->contains("ERROR: Server HTTP Status: 0"));
+  AXKynGeoFenceSet fence;
+  fence.friend_ = test::makePerson({"ada@example.com"}, {});
+  fence.requestedLocation = std::make_shared<AXLocation>();
+  fence.requestedLocation->label = "Work";
+  fence.geoFenceTrigger = std::string(AXKynGeoFenceTriggerOnDepartureValue);
+  fence.oneTimeOnly = true;
+  fence.fenceType = std::string(AXKynFenceTypeNotifyMeValue);
+  KYNAXDataSource::dataSource().setGeoFence(fence, [](const Value&) {});
+  auto set = std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back());
+  EXPECT_EQ(set->axPerson, fence.friend_);
+  EXPECT_NE(set->location(), fence.requestedLocation) << "the place is copied";
+  EXPECT_EQ(set->location()->label, "Work");
+  EXPECT_EQ(set->trigger, AXKynGeoFenceTriggerOnDepartureValue);
+  EXPECT_TRUE(set->onetimeonly);
+  EXPECT_FALSE(set->enable);  // absent is off
+  EXPECT_EQ(set->fenceType, AXKynFenceTypeNotifyMeValue);
+  fence.enable = true;
+  KYNAXDataSource::dataSource().setGeoFence(fence, [](const Value&) {});
+  EXPECT_TRUE(std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back())->enable);
+  for (const auto& command : controller->sent()) test::completeCommand(command, {});
 }
 
 TEST_F(KYNAXDataSourceTest, TheCycleIsBrokenEvenWhenTheAssistantsCompletionThrows) {
-  AXKynSearch search;
-  search.proximity = "near";
-  KYNAXDataSource::dataSource().search(search, [](const Value&) { throw std::runtime_error("host failure"); });
+  KYNAXDataSource::dataSource().search(AXKynSearch{}, [](const Value&) { throw std::runtime_error("host failure"); });
   auto command = controller->sent().at(0);
   std::weak_ptr<platform::KYJSONCommand> weak = command;
   test::completeCommand(command, {});
   EXPECT_FALSE(command->completionBlock());
   EXPECT_TRUE(log->contains("host failure"));
   command.reset();
-  controller = std::make_shared<test::FakeController>();
-  KYNAXDataSource::dataSource().setServerInteractionController(controller);  // drops the sent list
+  KYNAXDataSource::dataSource().setServerInteractionController(nullptr);  // drops the sent list
+  controller.reset();
   EXPECT_TRUE(weak.expired()) << "the command leaked";
 }
 
@@ -115,25 +177,22 @@ TEST_F(KYNAXDataSourceTest, AReplyThatCannotBeMadeIsStillOneFailure) {
   EXPECT_FALSE(command->completionBlock());
 }
 
-TEST_F(KYNAXDataSourceTest, WithoutAControllerTheSearchIsStillAnswered) {
+TEST_F(KYNAXDataSourceTest, WithoutAControllerEveryCommandIsStillAnswered) {
+  EXPECT_TRUE(KYNAXDataSource().serverInteractionController());  // a new source makes its own
   KYNAXDataSource::dataSource().setServerInteractionController(nullptr);
-  AXKynSearch search;
-  int replies = 0;
-  Value last;
-  KYNAXDataSource::dataSource().search(search, [&](const Value& r) {
-    ++replies;
-    last = r;
-  });
-  EXPECT_EQ(replies, 1);
-  EXPECT_EQ(last["errorCode"], AXKynServiceNotAvailableErrorCode);
+  std::vector<Value> replies;
+  const AXCompletion keep = [&](const Value& r) { replies.push_back(r); };
+  search(keep);
+  visibility(keep);
+  geoFence(keep);
+  ASSERT_EQ(replies.size(), 3u);
+  for (const auto& reply : replies) EXPECT_EQ(reply["errorCode"], AXKynServiceNotAvailableErrorCode);
 }
 
-TEST_F(KYNAXDataSourceTest, MockDataIsReadByNoOneAndLoggedWhenHandedIn) {
+TEST_F(KYNAXDataSourceTest, MockDataIsReadByNoOne) {
   KYNAXDataSource source;
   source.loadMockLocationData();  // no resource ships
   EXPECT_FALSE(source.mockLocations());
-  source.dataLoaded(Value::parse(R"({"k":1})"));
-  EXPECT_TRUE(log->contains(R"(dataLoaded: {"k":1})"));
 }
 
 }  // namespace

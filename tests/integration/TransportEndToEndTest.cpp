@@ -256,5 +256,39 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
   }
 }
 
+// Host threads may call perform at once (the thread sanitizer build watches this one): every
+// command gets exactly its own one reply, whether it is refused in the call or answered on the
+// network thread (nothing listens at the account's host).
+TEST(TransportEndToEnd, SeveralHostThreadsPerformAtOnce) {
+  test::TempDir configDir;
+  Account(configDir.path()).write(localhost(closedPort()), std::nullopt);
+  Plugin plugin;
+  plugin.configure(configDir.path());
+  const std::pair<std::string, std::string> commands[] = {
+      {searchFor({"ada@example.com"}), R"({"class":"AXCommandFailed","errorCode":1005})"},
+      {R"({"class":"AXKynVisibilityStateSet","visible":false})", R"({"class":"AXCommandFailed","errorCode":1005})"},
+      {R"({"class":"AXKynSearch"})",
+       R"({"class":"AXCommandFailed","reason":"Need at least emails or current location"})"},
+  };
+  constexpr int kThreads = 4, kEach = 3;
+  std::vector<std::unique_ptr<host::Reply>> boxes;
+  for (int i = 0; i < kThreads * kEach; ++i) boxes.push_back(std::make_unique<host::Reply>());
+  std::vector<std::thread> hosts;
+  for (int t = 0; t < kThreads; ++t) {
+    hosts.emplace_back([&, t] {
+      for (int i = 0; i < kEach; ++i) {
+        auto* box = boxes[t * kEach + i].get();
+        EXPECT_EQ(plugin.library().perform(commands[i].first.c_str(), &host::Reply::receive, box), 0);
+      }
+    });
+  }
+  for (auto& h : hosts) h.join();
+  for (int i = 0; i < kThreads * kEach; ++i) {
+    EXPECT_EQ(Json::parse(boxes[i]->wait(30s).value_or("null")), Json::parse(commands[i % kEach].second)) << i;
+  }
+  plugin.shutdown();
+  for (const auto& box : boxes) EXPECT_EQ(box->count(), 1);
+}
+
 }  // namespace
 }  // namespace kyn::itest

@@ -1,10 +1,10 @@
 #include "model/KYNAXMyLocation.h"
-#include "support/ContactsTest.h"
+#include "support/PlatformTest.h"
 
 namespace kyn {
 namespace {
 
-class KYNAXMyLocationTest : public test::ContactsTest {};
+using KYNAXMyLocationTest = test::PlatformTest;
 
 TEST_F(KYNAXMyLocationTest, TheUserIsNamedByThePreferredAddressElseTheAccount) {
   systemInfo->signIn("P-1", "token", "host", "ada.account@example.test");
@@ -18,7 +18,7 @@ TEST_F(KYNAXMyLocationTest, TheUserIsNamedByThePreferredAddressElseTheAccount) {
   const auto wrapped = KYNAXMyLocation::myLocation(false, given, "ada@example.com");
   EXPECT_EQ(wrapped->avixLocation, given);
   EXPECT_FALSE(given->friend_);
-  EXPECT_GT(store->queries, 0);
+  EXPECT_GT(addressBook->queries, 0);
   EXPECT_FALSE(wrapped->isVisible);
   EXPECT_EQ(KYNAXMyLocation::myLocation(false, std::shared_ptr<AXKynLocation>(), "ada@example.com")->friendHandle(),
             "ada@example.com");

@@ -1,5 +1,5 @@
 #include "model/KYNAXLocation.h"
-#include "support/ContactsTest.h"
+#include "support/PlatformTest.h"
 #include "utils/KYNAXUtils.h"
 
 namespace kyn {
@@ -7,7 +7,7 @@ namespace {
 
 using platform::services;
 
-class PresentationTest : public test::ContactsTest {
+class PresentationTest : public test::PlatformTest {
  protected:
   static std::shared_ptr<KYNAXLocation> fixedAt(std::optional<double> date) {
     auto location = std::make_shared<AXKynLocation>();
@@ -39,8 +39,7 @@ TEST_F(PresentationTest, TimestampsAroundTheTwoMidnights) {
 }
 
 TEST_F(PresentationTest, ADistanceNeedsBothPlacesAndIsLogged) {
-  auto here = std::make_shared<platform::Location>();
-  here->coordinate = {45.5231, -122.6765};
+  const auto here = std::make_shared<platform::Location>(test::fix(45.5231, -122.6765));
   auto location = std::make_shared<AXKynLocation>();
   const auto record = KYNAXLocation::locationWithAvixLocation(location);
   location->friend_ = std::make_shared<AXPersonAttribute>();
@@ -54,10 +53,8 @@ TEST_F(PresentationTest, ADistanceNeedsBothPlacesAndIsLogged) {
 
   const auto text = record->distanceFromLocation(here);
   ASSERT_TRUE(text);
-  platform::Location there;
-  there.coordinate = {45.5152, -122.6784};
   const auto calculator = KYNAXLocation::distanceCalculator();
-  EXPECT_EQ(text, calculator->localizedDistanceFromLocation(*here, there));
+  EXPECT_EQ(text, calculator->localizedDistanceFromLocation(*here, test::fix(45.5152, -122.6784)));
   EXPECT_TRUE(log->contains("Distance calculated: " + *text + " for friend: Ada Lovelace (Unit:" +
                             std::to_string(calculator->measurementSystem()) + ")"));
   EXPECT_EQ(KYNAXLocation::distanceCalculator(), calculator);  // one for the process
@@ -65,17 +62,17 @@ TEST_F(PresentationTest, ADistanceNeedsBothPlacesAndIsLogged) {
 
 TEST_F(PresentationTest, PicturesComeFromTheFirstContactWithAFullPicture) {
   const auto emailPicture = test::tinyPicture(), phonePicture = test::tinyPicture(), idPicture = test::tinyPicture();
-  store->add("a").emailAddresses = {{"home", "first@example.com"}};
-  auto& thumbnailOnly = store->add("b");
+  addressBook->add("a").emailAddresses = {{"home", "first@example.com"}};
+  auto& thumbnailOnly = addressBook->add("b");
   thumbnailOnly.emailAddresses = {{"home", "second@example.com"}};
   thumbnailOnly.thumbnailImageData = test::tinyPicture();
-  auto& byEmail = store->add("c");
+  auto& byEmail = addressBook->add("c");
   byEmail.emailAddresses = {{"home", "third@example.com"}};
   byEmail.imageData = emailPicture;
-  auto& byPhone = store->add("d");
+  auto& byPhone = addressBook->add("d");
   byPhone.phoneNumbers = {{"mobile", "(503) 555-0102"}};
   byPhone.imageData = phonePicture;
-  store->add("e").imageData = idPicture;
+  addressBook->add("e").imageData = idPicture;
 
   auto encodedOf = [](const std::shared_ptr<const platform::Image>& image) {
     return image ? image->encoded : nullptr;
@@ -102,14 +99,14 @@ TEST_F(PresentationTest, PicturesComeFromTheFirstContactWithAFullPicture) {
   location->friend_ = attribute;
   const auto record = KYNAXLocation::locationWithAvixLocation(location);
   ASSERT_TRUE(record->friendImage());
-  const int queries = store->queries;
+  const int queries = addressBook->queries;
   EXPECT_EQ(record->friendImage(), record->cachedFriendImage);
-  EXPECT_EQ(store->queries, queries);
+  EXPECT_EQ(addressBook->queries, queries);
   attribute->object = test::makePerson({"first@example.com"}, {});
   const auto without = KYNAXLocation::locationWithAvixLocation(location);
   EXPECT_FALSE(without->friendImage());
   EXPECT_FALSE(without->friendImage());
-  EXPECT_GT(store->queries, queries + 1);
+  EXPECT_GT(addressBook->queries, queries + 1);
 }
 
 }  // namespace

@@ -12,13 +12,10 @@ constexpr std::string_view kSuite = "group.com.zanto.aerix.ky";
 
 /// Two places on the equator `metres` apart (the equator is the geodesic between them).
 std::pair<Location, Location> apart(double metres) {
-  Location from, to;
-  from.coordinate = {0.0, 10.0};
-  to.coordinate = {0.0, 10.0 + metres / 6'378'137.0 * 180.0 / std::numbers::pi};
-  return {from, to};
+  return {test::fix(0.0, 10.0), test::fix(0.0, 10.0 + metres / 6'378'137.0 * 180.0 / std::numbers::pi)};
 }
 
-class DistanceCalculatorTest : public test::PlatformTest {};
+using DistanceCalculatorTest = test::PlatformTest;
 
 // Wellington to Salamanca, nearly antipodal: 19,959,679.267 m in GeographicLib's documentation.
 TEST(GeodesicDistance, MatchesTheWGS84ReferenceValue) {
@@ -71,9 +68,7 @@ TEST_F(DistanceCalculatorTest, ThePhraseComesFromTheDelegateInTheWordsLanguage) 
   french->setLocalizationDelegate(services().localization.get());
   EXPECT_EQ(french->localizedDistanceFromLocation(from, to), "à 1,2\u202Fkm");
 
-  Location invalid;
-  invalid.coordinate = {91.0, 0.0};
-  EXPECT_FALSE(german->localizedDistanceFromLocation(from, invalid));
+  EXPECT_FALSE(german->localizedDistanceFromLocation(from, test::fix(91.0, 0.0)));
 }
 
 TEST_F(DistanceCalculatorTest, APreferenceOverridesTheRegionsUnits) {

@@ -79,27 +79,5 @@ TEST(Model, ValuesOfTheWrongTypeAreLeftAbsent) {
   EXPECT_EQ(search->requestedLocation->longitude, 1e308);
 }
 
-TEST(Model, ErrorCodesAreDistinctAndNamed) {
-  const std::int64_t codes[] = {AXKynNotLoggedInErrorCode, AXKynServiceRestrictedInRegionErrorCode,
-                                AXKynServiceRestrictedInAccountErrorCode, AXKynLockedErrorCode,
-                                AXKynServiceNotAvailableErrorCode, AXKynNotAFriendErrorCode,
-                                AXKynNoFriendsErrorCode, AXKynGeoFenceNotCreatedErrorCode,
-                                AXKynLabelNotFoundErrorCode, AXKynAddressNotFoundErrorCode};
-  std::set<std::string_view> names;
-  for (auto code : codes) {
-    auto name = errorCodeName(code);
-    ASSERT_TRUE(name) << code;
-    names.insert(*name);
-  }
-  EXPECT_EQ(names.size(), std::size(codes));
-  EXPECT_FALSE(errorCodeName(0));
-}
-
-TEST(Model, DescriptionNamesTheClass) {
-  AXEmail email;
-  email.emailAddress = "a@b";
-  EXPECT_EQ(email.description(), R"(<AXEmail {"class":"AXEmail","emailAddress":"a@b"}>)");
-}
-
 }  // namespace
 }  // namespace kyn

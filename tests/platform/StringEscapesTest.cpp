@@ -56,7 +56,7 @@ TEST(Numeric, LeadingIntegerSaturates) {
   EXPECT_EQ(leadingInteger32("2147483647"), 2147483647);
   EXPECT_EQ(leadingInteger32("-2147483648"), -2147483648);
   EXPECT_EQ(leadingInteger32("3.99"), 3);
-  EXPECT_EQ(leadingInteger32("  -12abc"), -12);
+  EXPECT_EQ(leadingInteger32(" \t\n\v\f\r-12abc"), -12);  // the blanks strtol skips
   EXPECT_EQ(leadingInteger32("1e5"), 1);
   EXPECT_EQ(leadingInteger32("abc"), 0);
   EXPECT_EQ(leadingInteger64("-9223372036854775808"), INT64_MIN);

@@ -1,13 +1,12 @@
 #include "platform/sysinfo/LinuxSystemInfo.h"
 #include "support/PlatformTest.h"
 
-#include <unistd.h>
-
 #include <cstdlib>
-#include <fstream>
 
 namespace kyn::platform {
 namespace {
+
+namespace fs = std::filesystem;
 
 class SystemInfoTest : public test::PlatformTest {
  protected:
@@ -23,12 +22,12 @@ class SystemInfoTest : public test::PlatformTest {
     return LinuxSystemInfo(LinuxSystemInfo::Paths{configDir->path() / "account.json", configDir->path() / "token",
                                                   configDir->path() / "product_name", configDir->path() / "os-release"});
   }
+  std::optional<std::string> token() { return info().ownerAccount()->tokenOfType(0); }
 };
 
 TEST_F(SystemInfoTest, AFullAccountFileGivesTheAccountAndItsToken) {
-  configDir->write("account.json",
-                   R"({"personId":"P7","username":"ada@example.test","serviceHost":"kyn.example.test:8443",
-                       "provisioned":true,"restricted":false})");
+  configDir->write("account.json", R"({"personId":"P7","username":"ada@example.test",
+                                       "serviceHost":"kyn.example.test:8443","provisioned":true})");
   configDir->write("token", "  tok-123\n", 0600);
   auto account = info().ownerAccount();
   ASSERT_TRUE(account);
@@ -36,67 +35,30 @@ TEST_F(SystemInfoTest, AFullAccountFileGivesTheAccountAndItsToken) {
   EXPECT_EQ(account->username(), "ada@example.test");
   EXPECT_EQ(account->tokenOfType(0), "tok-123");
   EXPECT_EQ(account->hostNameOfType(0), "kyn.example.test:8443");
-  EXPECT_FALSE(account->tokenOfType(1));
-  EXPECT_FALSE(account->hostNameOfType(1));
+  EXPECT_FALSE(account->tokenOfType(1) || account->hostNameOfType(1));
   EXPECT_FALSE(log->contains("tok-123"));
 }
 
-TEST_F(SystemInfoTest, MissingEmptyOrMalformedAccountFilesMeanNoAccount) {
-  EXPECT_FALSE(info().ownerAccount());  // missing: no log line
-  EXPECT_TRUE(logMessages().empty());
-  for (const char* text : {"", "{", "[]", "\"text\"", "null", "{\"personId\": 12"}) {
+TEST_F(SystemInfoTest, AccountFilesThatNameNoOne) {
+  AccountFileSession fileSession(configDir->path() / "account.json");
+  EXPECT_FALSE(info().ownerAccount());  // missing: no error
+  EXPECT_FALSE(fileSession.isProvisionedForLocationSharing() || fileSession.isRestricted());
+  EXPECT_TRUE(log->messages(LogLevel::Error).empty());
+  for (const char* text : {"", "{", "[]", "null", "{\"personId\": 12"}) {
     configDir->write("account.json", text);
     EXPECT_FALSE(info().ownerAccount()) << text;
   }
-  EXPECT_TRUE(log->contains("is not a JSON object"));
-}
-
-TEST_F(SystemInfoTest, FieldsOfTheWrongTypeReadAsAbsent) {
+  // Fields of the wrong type read as absent: the file parses, yet names no one.
   configDir->write("account.json", R"({"personId":42,"username":["a"],"serviceHost":null,"provisioned":"yes"})");
   auto account = info().ownerAccount();
-  ASSERT_TRUE(account);  // the file exists and parses; it just names no one
-  EXPECT_FALSE(account->personId());
-  EXPECT_FALSE(account->username());
-  EXPECT_FALSE(account->hostNameOfType(0));
-  EXPECT_TRUE(log->contains("field personId has the wrong type"));
-  AccountFileSession fileSession(configDir->path() / "account.json");
-  EXPECT_FALSE(fileSession.isProvisionedForLocationSharing());  // no person, nothing provisioned
-}
-
-TEST_F(SystemInfoTest, ATokenFileThatOthersCanReadIsRefused) {
-  configDir->write("account.json", R"({"personId":"P7"})");
-  for (unsigned mode : {0644u, 0640u, 0604u, 0620u}) {
-    configDir->write("token", "tok-123", mode);
-    EXPECT_FALSE(info().ownerAccount()->tokenOfType(0)) << std::oct << mode;
-  }
-  EXPECT_TRUE(log->contains("may be read by others"));
-  EXPECT_FALSE(log->contains("tok-123"));
-  configDir->write("token", "tok-123", 0400);
-  EXPECT_EQ(info().ownerAccount()->tokenOfType(0), "tok-123");
-}
-
-TEST_F(SystemInfoTest, TokenFromTheEnvironmentWinsAndEmptyTokensAreNone) {
-  configDir->write("account.json", R"({"personId":"P7"})");
-  configDir->write("token", " \n", 0600);
-  EXPECT_FALSE(info().ownerAccount()->tokenOfType(0));
-  ::setenv("KYN_APP_TOKEN", "env-token", 1);
-  EXPECT_EQ(info().ownerAccount()->tokenOfType(0), "env-token");
-}
-
-TEST_F(SystemInfoTest, ATokenThatIsADirectoryOrASymlinkIsRefused) {
-  configDir->write("account.json", R"({"personId":"P7"})");
-  const auto real = configDir->write("real-token", "tok", 0600);
-  std::filesystem::create_symlink(real, configDir->path() / "token");
-  EXPECT_FALSE(info().ownerAccount()->tokenOfType(0));
-  std::filesystem::remove(configDir->path() / "token");
-  std::filesystem::create_directory(configDir->path() / "token");
-  EXPECT_FALSE(info().ownerAccount()->tokenOfType(0));
+  ASSERT_TRUE(account);
+  EXPECT_FALSE(account->personId() || account->username() || account->hostNameOfType(0));
+  EXPECT_FALSE(fileSession.isProvisionedForLocationSharing());
+  EXPECT_EQ(log->messages(LogLevel::Error).size(), 5u + 3u);  // each bad file, each field of the wrong type
 }
 
 TEST_F(SystemInfoTest, SessionFlagsDefaultToProvisionedAndUnrestricted) {
   AccountFileSession fileSession(configDir->path() / "account.json");
-  EXPECT_FALSE(fileSession.isProvisionedForLocationSharing());
-  EXPECT_FALSE(fileSession.isRestricted());
   configDir->write("account.json", R"({"personId":"P7"})");
   EXPECT_TRUE(fileSession.isProvisionedForLocationSharing());
   EXPECT_FALSE(fileSession.isRestricted());
@@ -105,35 +67,106 @@ TEST_F(SystemInfoTest, SessionFlagsDefaultToProvisionedAndUnrestricted) {
   EXPECT_TRUE(fileSession.isRestricted());
 }
 
+TEST_F(SystemInfoTest, OnlyAPrivateRegularTokenFileIsRead) {
+  configDir->write("account.json", R"({"personId":"P7"})");
+  for (unsigned mode : {0644u, 0640u, 0604u, 0620u}) {
+    configDir->write("token", "tok-123", mode);
+    EXPECT_FALSE(token()) << std::oct << mode;
+  }
+  configDir->write("token", "tok-123", 0400);
+  EXPECT_EQ(token(), "tok-123");
+  configDir->write("token", " \n", 0600);
+  EXPECT_FALSE(token());  // an empty token is none
+  ::setenv("KYN_APP_TOKEN", "env-token", 1);
+  EXPECT_EQ(token(), "env-token");  // the environment wins
+  ::unsetenv("KYN_APP_TOKEN");
+
+  fs::remove(configDir->path() / "token");
+  fs::create_symlink(configDir->write("real-token", "tok-456", 0600), configDir->path() / "token");
+  EXPECT_FALSE(token());
+  fs::remove(configDir->path() / "token");
+  fs::create_directory(configDir->path() / "token");
+  EXPECT_FALSE(token());
+  EXPECT_FALSE(log->contains("tok-123") || log->contains("tok-456"));
+}
+
 TEST_F(SystemInfoTest, DeviceFacts) {
   configDir->write("product_name", "ThinkStation P3\n");
-  configDir->write("os-release", "NAME=\"Debian GNU/Linux\"\nVERSION_ID=\"12\"\nBUILD_ID=rolling\n");
+  configDir->write("os-release", "NAME=\"Debian\"\nVERSION_IDX=9\nVERSION_ID='12'\nEMPTY=\"\"\nBUILD_ID=rolling\n");
   auto facts = info();
   EXPECT_EQ(facts.productType(), "ThinkStation P3");
   EXPECT_EQ(facts.osVersion(), "12");
   EXPECT_EQ(facts.osBuildVersion(), "rolling");
+  EXPECT_FALSE(osReleaseField("EMPTY=\"\"\n", "EMPTY"));
   configDir->write("product_name", "  \n");
   EXPECT_FALSE(facts.productType());
+  configDir->write("os-release", "VERSION_ID=12\n");
+  EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead
   if (auto udid = facts.deviceUDID()) {  // needs a machine id
     EXPECT_EQ(udid->size(), 36u);
     EXPECT_EQ(*udid, facts.deviceUDID());
-    std::ifstream machine("/etc/machine-id");
-    std::string raw;
-    machine >> raw;
     std::string compact;
     for (char c : *udid) {
       if (c != '-') compact += static_cast<char>(std::tolower(static_cast<unsigned char>(c)));
     }
-    EXPECT_NE(compact, raw) << "the raw machine id must not leave the machine";
+    EXPECT_EQ(test::readFile("/etc/machine-id").find(compact), std::string::npos)
+        << "the raw machine id must not leave the machine";
   }
 }
 
-TEST(OsRelease, Fields) {
-  const char* text = "A=1\nVERSION_ID='10.15.7'\nEMPTY=\"\"\nVERSION_IDX=9\n";
-  EXPECT_EQ(osReleaseField(text, "VERSION_ID"), "10.15.7");
-  EXPECT_FALSE(osReleaseField(text, "EMPTY"));
-  EXPECT_FALSE(osReleaseField(text, "VERSION"));
-  EXPECT_EQ(osReleaseField(text, "A"), "1");
+TEST(SignInCheck, EachFieldIsCheckedInTurn) {
+  const SignIn good{"P-1", "sam@example.com", "kyn.example.test:8443", "tok-5f1c"};
+  const std::string longText(257, 'a');
+  const struct {
+    SignIn signIn;
+    SignInProblem problem;
+  } cases[] = {
+      {good, SignInProblem::None},
+      {{"", "u", "h", "t"}, SignInProblem::PersonId},
+      {{" P-1", "u", "h", "t"}, SignInProblem::PersonId},
+      {{"P-1 ", "u", "h", "t"}, SignInProblem::PersonId},
+      {{"P\x01", "u", "h", "t"}, SignInProblem::PersonId},
+      {{longText, "u", "h", "t"}, SignInProblem::PersonId},
+      {{"P-1", "a\x7f", "h", "t"}, SignInProblem::Username},
+      {{"P-1", "u", "h", "two words"}, SignInProblem::Token},
+      {{"P-1", "u", "h", "tab\there"}, SignInProblem::Token},
+      {{"P-1", "u", "h", ""}, SignInProblem::Token},
+      {{"P-1", "u", "h", std::string(4097, 't')}, SignInProblem::Token},
+      {{"P-1", "u", "h", std::string(4096, 't')}, SignInProblem::None},
+  };
+  for (const auto& c : cases) EXPECT_EQ(checkSignIn(c.signIn), c.problem) << c.signIn.personId << c.signIn.token;
+
+  for (const char* host : {"kyn.example.test", "a-b.example:65535", "127.0.0.1:1", "[::1]:8443", "[::1]", "x"}) {
+    EXPECT_EQ(checkSignIn({"P", "u", host, "t"}), SignInProblem::None) << host;
+  }
+  for (const char* host : {"", "https://x", "x:", "x:0", "x:65536", "x:123456", "x:8a", ":80", ".x", "-x", "x y",
+                           "x_y", "[::1", "[]", "[::1]:", "[::1]x", "[g::1]", "[::1]:0"}) {
+    EXPECT_EQ(checkSignIn({"P", "u", host, "t"}), SignInProblem::ServiceHost) << host;
+  }
+  EXPECT_EQ(checkSignIn({"P", "u", std::string(254, 'h'), "t"}), SignInProblem::ServiceHost);
+}
+
+TEST_F(SystemInfoTest, SigningInWritesBothFilesWholeAndSigningOutRemovesThem) {
+  const fs::path dir = configDir->path() / "new" / "config";
+  ASSERT_TRUE(writeSignIn(dir, {"P-1", "sam@example.com", "kyn.example.test", "tok-1"}));
+  EXPECT_EQ(fs::status(dir).permissions() & fs::perms::all, fs::perms::owner_all);
+  EXPECT_EQ(fs::status(dir / "token").permissions() & fs::perms::all, fs::perms::owner_read | fs::perms::owner_write);
+  EXPECT_EQ(readApplicationToken(dir / "token"), "tok-1");
+  EXPECT_EQ(readAccountFile(dir / "account.json")->serviceHost, "kyn.example.test");
+
+  // Wrong input, or an account file that cannot be replaced, leaves the old account whole.
+  EXPECT_FALSE(writeSignIn(dir, {"P-2", "ada@example.com", "https://x", "tok-2"}));
+  fs::create_directory(dir / "account.json.new");  // no file can be staged there
+  EXPECT_FALSE(writeSignIn(dir, {"P-2", "ada@example.com", "h", "tok-2"}));
+  EXPECT_FALSE(log->messages(LogLevel::Error).empty());  // the log says why
+  EXPECT_FALSE(fs::exists(dir / "token.new"));
+  EXPECT_EQ(readApplicationToken(dir / "token"), "tok-1");
+  EXPECT_EQ(readAccountFile(dir / "account.json")->personId, "P-1");
+  EXPECT_FALSE(log->contains("tok-"));
+
+  EXPECT_TRUE(removeSignIn(dir));
+  EXPECT_FALSE(fs::exists(dir / "account.json") || fs::exists(dir / "token"));
+  EXPECT_FALSE(removeSignIn(dir));
 }
 
 }  // namespace

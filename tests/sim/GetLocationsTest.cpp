@@ -38,35 +38,6 @@ class GetLocationsTest : public ::testing::Test {
   static Json northOfAda(double metres) { return at(45.0 + metres / kMetresPerDegree, -122.0); }
 };
 
-TEST_F(GetLocationsTest, WithoutFriendsTheAnswerIs417WithoutLocations) {
-  data.friends.clear();
-  const Json answer = ask(Json{{"handles", {"ada@example.com"}}});
-  EXPECT_EQ(answer["statusCode"], 417);
-  EXPECT_FALSE(answer.contains("locations"));
-  EXPECT_FALSE(answer.contains("emails"));
-  EXPECT_TRUE(answer.contains("serverContext"));
-}
-
-TEST_F(GetLocationsTest, StrangersGet411EntriesAndA411AnswerWhenNobodyIsAFriend) {
-  Json answer = ask(Json{{"handles", {"+15035550199", "eve@example.com"}}});
-  EXPECT_EQ(answer["statusCode"], 411);
-  EXPECT_EQ(answer["locations"], Json({{"+15035550199", {{"status", 411}}}, {"eve@example.com", {{"status", 411}}}}));
-
-  answer = ask(Json{{"handles", {"+15035550199", "ada@example.com"}}});
-  EXPECT_EQ(answer["statusCode"], 200);
-  EXPECT_EQ(answer["locations"]["+15035550199"], Json({{"status", 411}}));
-  EXPECT_EQ(answer["locations"]["ada@example.com"]["status"], 200);
-}
-
-TEST_F(GetLocationsTest, APendingFriendHasANullLocationAndMakesTheAnswer416) {
-  const Json answer = ask(Json{{"handles", {"ada@example.com", "+15035550102"}}, {"myLocation", at(45, -122)},
-                               {"requestedLocation", at(45, -122)}});
-  EXPECT_EQ(answer["statusCode"], 416);
-  const Json& bram = answer["locations"]["+15035550102"];
-  EXPECT_EQ(bram, Json({{"status", 200}, {"match", false}, {"location", nullptr}}));  // no distance, no match
-  EXPECT_EQ(answer["locations"]["ada@example.com"]["match"], true);
-}
-
 TEST_F(GetLocationsTest, NoHandlesAnswersEveryFriendWithoutEmails) {
   for (const Json& request : {Json::object(), Json{{"handles", Json::array()}}}) {
     const Json answer = ask(request);

@@ -52,40 +52,6 @@ std::optional<std::string> header(const Reply& r, const std::string& name) {
   return std::nullopt;
 }
 
-TEST(RouterTest, HostNamesOfHostHeaders) {
-  EXPECT_EQ(hostNameOf("localhost:8443"), "localhost");
-  EXPECT_EQ(hostNameOf("LocalHost"), "localhost");
-  EXPECT_EQ(hostNameOf("127.0.0.1:8443"), "127.0.0.1");
-  EXPECT_EQ(hostNameOf("[::1]:8443"), "::1");
-  EXPECT_EQ(hostNameOf("[::1]"), "::1");
-  EXPECT_EQ(hostNameOf("::1"), "::1");
-  EXPECT_EQ(hostNameOf(""), "");
-}
-
-TEST(RouterTest, RedirectsGoToTheCanonicalHostWithPortAndTarget) {
-  EXPECT_FALSE(redirectLocation("127.0.0.1:8443", "127.0.0.1", 8443, "/a"));
-  EXPECT_FALSE(redirectLocation("SIM.example.org", "sim.example.org", 8443, "/a"));
-  EXPECT_EQ(redirectLocation("localhost:8443", "127.0.0.1", 8443, "/a/b?x=1"), "https://127.0.0.1:8443/a/b?x=1");
-  EXPECT_EQ(redirectLocation("", "127.0.0.1", 8443, "/a"), "https://127.0.0.1:8443/a");  // no Host: not canonical
-  EXPECT_EQ(redirectLocation("localhost", "::1", 8443, "/a"), "https://[::1]:8443/a");
-}
-
-TEST(RouterTest, TheRedirectComesBeforeAuthorisation) {
-  auto router = makeRouter(canonical("127.0.0.1"));
-  Call call = getLocations("localhost:8443");
-  call.authorization.reset();
-  Outcome out = router->handle(call, kNow);
-  EXPECT_EQ(out.reply.status, 307);
-  EXPECT_EQ(header(out.reply, "Location"), "https://127.0.0.1:8443" + std::string(kGetLocationsPath));
-  EXPECT_FALSE(out.authorised);
-
-  out = router->handle(getLocations("127.0.0.1:8443"), kNow);
-  EXPECT_EQ(out.reply.status, 200);
-  EXPECT_TRUE(out.authorised);
-  EXPECT_EQ(out.handles, Json({"ada@example.com"}));
-  EXPECT_EQ(Json::parse(out.reply.body)["statusCode"], 200);
-}
-
 TEST(RouterTest, ErrorsOfAuthorisationPathMethodAndBody) {
   auto router = makeRouter();
   Call call = getLocations();
@@ -170,60 +136,6 @@ TEST(RouterTest, TheControlPathTakesOnlyTheControlSecretAndMovesPeople) {
   move.body = R"({"handle": "ada@example.com", "latitude": 91, "longitude": 2})";
   EXPECT_EQ(router->handle(move, kNow).reply.status, 400);
   EXPECT_EQ(makeRouter()->handle(move, kNow).reply.status, 401);  // no control secret, no control
-}
-
-TEST(RouterTest, EachFaultKind) {
-  auto first = [](const char* text) { return makeRouter(faulty(text))->handle(getLocations(), kNow); };
-
-  Outcome out = first("reset");
-  EXPECT_EQ(out.reply.delivery, Reply::Delivery::Reset);
-
-  out = first("truncate");  // the real answer, to be cut short
-  EXPECT_EQ(out.reply.delivery, Reply::Delivery::Truncate);
-  EXPECT_EQ(Json::parse(out.reply.body)["statusCode"], 200);
-
-  out = first("slow:1500");
-  EXPECT_EQ(out.reply.delay, std::chrono::milliseconds(1500));
-  EXPECT_EQ(out.reply.status, 200);
-  EXPECT_EQ(Json::parse(out.reply.body)["statusCode"], 200);
-
-  for (int i = 0; i < 20; ++i) {
-    out = first("garbage");
-    EXPECT_EQ(out.reply.status, 200);
-    EXPECT_FALSE(Json::accept(out.reply.body));
-  }
-
-  host::TempDir dir;
-  const auto path = dir.path() / "hostile.json";
-  auto router = makeRouter(faulty("body:" + path.string()));
-  const std::string bytes("{\"statusCode\":\"200\",\"locations\":[\0]}", 35);
-  writeFileAtomically(path, bytes);
-  EXPECT_EQ(router->handle(getLocations(), kNow).reply.body, bytes);
-  writeFileAtomically(path, "[]");  // read afresh for every request
-  EXPECT_EQ(router->handle(getLocations(), kNow).reply.body, "[]");
-  std::filesystem::remove(path);
-  EXPECT_EQ(router->handle(getLocations(), kNow).reply.status, 500);
-}
-
-TEST(RouterTest, TheLogLineRecordsTheRequestButNoCredentials) {
-  auto router = makeRouter(faulty("reset"));
-  const Call call = getLocations("localhost:8443");
-  const Json line = requestLogLine(call, router->handle(call, kNow), std::chrono::system_clock::time_point{});
-  EXPECT_EQ(line, Json({{"time", "1970-01-01T00:00:00.000Z"},
-                        {"method", "POST"},
-                        {"path", kGetLocationsPath},
-                        {"host", "localhost:8443"},
-                        {"authorised", true},
-                        {"account", "1000000001"},
-                        {"handles", {"ada@example.com"}},
-                        {"status", nullptr},
-                        {"apiVersionHeader", true},
-                        {"apiVersion", "4.0"},
-                        {"authScheme", nullptr},
-                        {"fault", "reset"}}));
-  EXPECT_EQ(line.dump().find("MTAwMDAwMDAwMTpzM2NyZXQ"), std::string::npos);
-  EXPECT_EQ(isoTime(std::chrono::system_clock::time_point{std::chrono::milliseconds(1'763'740'800'123)}),
-            "2025-11-21T16:00:00.123Z");
 }
 
 }  // namespace

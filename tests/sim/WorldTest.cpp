@@ -69,26 +69,6 @@ class WorldTest : public ::testing::Test {
   World world{data(), [this](const Json& n) { notes.push_back(n); }};
 };
 
-TEST_F(WorldTest, HidingTakesTheLocationFromFriendsAndShowingBringsItBack) {
-  const auto visibility = [&](const Json& yesNo) { return hide(0, yesNo); };
-  const Json answer = visibility("Yes");
-  EXPECT_EQ(answer["statusCode"], 200);
-  EXPECT_EQ(answer["myInfo"],
-            Json({{"location", {{"latitude", 45.0}, {"longitude", -122.0}, {"timestamp", kNow - 10'000}}},
-                  {"preferredEmail", "sam@example.com"}}));
-  EXPECT_EQ(answer["serverContext"]["authToken"], kServerContextAuthToken);
-  EXPECT_TRUE(seenBy(1, "sam@example.com").is_null());
-  EXPECT_FALSE(seenBy(0, "ada@example.com").is_null());  // hiding is Sam's alone
-
-  EXPECT_EQ(visibility("No")["myInfo"]["preferredEmail"], "sam@example.com");
-  EXPECT_EQ(seenBy(1, "sam@example.com")["latitude"], 45.0);
-
-  for (const Json& bad : {Json("yes"), Json(true), Json(nullptr)}) {
-    EXPECT_THROW(visibility(bad), BadRequest) << bad;
-  }
-  EXPECT_THROW(answerShowHideLocation(world, 0, {{"clientContext", Json::object()}}, kNow), BadRequest);
-}
-
 TEST_F(WorldTest, EachGeofenceOutcomeHasItsCode) {
   struct Case {
     const char* what;

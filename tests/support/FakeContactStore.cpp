@@ -3,6 +3,8 @@
 #include "platform/phone/PhoneNumbers.h"
 #include "platform/text/Unicode.h"
 
+#include <algorithm>
+
 namespace kyn::test {
 
 using platform::Contact;
@@ -15,70 +17,48 @@ platform::Contact& FakeContactStore::add(std::string identifier) {
   return contacts_.back();
 }
 
-std::vector<std::shared_ptr<const Contact>> FakeContactStore::unifiedContactsMatchingEmailAddress(
-    std::string_view emailAddress, const ContactKeys& keys, std::string* /*error*/) {
+FakeContactStore::Contacts FakeContactStore::matching(const ContactKeys& keys,
+                                                      const std::function<bool(const Contact&)>& wanted) {
   ++queries;
   std::lock_guard lock(mutex_);
   lastKeys = keys;
-  std::vector<std::shared_ptr<const Contact>> out;
-  const std::string wanted = platform::foldCase(emailAddress);
+  Contacts out;
   for (const auto& c : contacts_) {
-    for (const auto& e : c.emailAddresses) {
-      if (platform::foldCase(e.value) == wanted) {
-        out.push_back(std::make_shared<const Contact>(platform::projectContact(c, keys)));
-        break;
-      }
-    }
+    if (wanted(c)) out.push_back(std::make_shared<const Contact>(platform::projectContact(c, keys)));
   }
   return out;
 }
 
-std::vector<std::shared_ptr<const Contact>> FakeContactStore::unifiedContactsMatchingPhoneNumber(
-    std::string_view phoneNumber, const ContactKeys& keys, std::string* /*error*/) {
-  ++queries;
-  std::lock_guard lock(mutex_);
-  lastKeys = keys;
+FakeContactStore::Contacts FakeContactStore::unifiedContactsMatchingEmailAddress(std::string_view emailAddress,
+                                                                                 const ContactKeys& keys, std::string*) {
+  const std::string wanted = platform::foldCase(emailAddress);
+  return matching(keys, [&](const Contact& c) {
+    return std::any_of(c.emailAddresses.begin(), c.emailAddresses.end(),
+                       [&](const auto& e) { return platform::foldCase(e.value) == wanted; });
+  });
+}
+
+FakeContactStore::Contacts FakeContactStore::unifiedContactsMatchingPhoneNumber(std::string_view phoneNumber,
+                                                                                const ContactKeys& keys, std::string*) {
   auto canonical = [](std::string_view s) {
     return platform::formatPhoneNumber(s, "us", platform::PhoneNumberStyle::Canonical).value_or(std::string(s));
   };
   const std::string wanted = canonical(phoneNumber);
-  std::vector<std::shared_ptr<const Contact>> out;
-  for (const auto& c : contacts_) {
-    for (const auto& p : c.phoneNumbers) {
-      if (canonical(p.value) == wanted) {
-        out.push_back(std::make_shared<const Contact>(platform::projectContact(c, keys)));
-        break;
-      }
-    }
-  }
-  return out;
+  return matching(keys, [&](const Contact& c) {
+    return std::any_of(c.phoneNumbers.begin(), c.phoneNumbers.end(),
+                       [&](const auto& p) { return canonical(p.value) == wanted; });
+  });
 }
 
 std::shared_ptr<const Contact> FakeContactStore::unifiedContactWithIdentifier(std::string_view identifier,
-                                                                             const ContactKeys& keys,
-                                                                             std::string* /*error*/) {
-  ++queries;
-  std::lock_guard lock(mutex_);
-  lastKeys = keys;
-  for (const auto& c : contacts_) {
-    if (c.identifier == identifier) return std::make_shared<const Contact>(platform::projectContact(c, keys));
-  }
-  return nullptr;
+                                                                             const ContactKeys& keys, std::string*) {
+  const auto found = matching(keys, [&](const Contact& c) { return c.identifier == identifier; });
+  return found.empty() ? nullptr : found.front();
 }
 
-std::vector<std::shared_ptr<const Contact>> FakeContactStore::unifiedContactsMatchingName(std::string_view name,
-                                                                                       const ContactKeys& keys,
-                                                                                       std::string* /*error*/) {
-  ++queries;
-  std::lock_guard lock(mutex_);
-  lastKeys = keys;
-  std::vector<std::shared_ptr<const Contact>> out;
-  for (const auto& c : contacts_) {
-    if (platform::contactMatchesName(c, name, "en_US")) {
-      out.push_back(std::make_shared<const Contact>(platform::projectContact(c, keys)));
-    }
-  }
-  return out;
+FakeContactStore::Contacts FakeContactStore::unifiedContactsMatchingName(std::string_view name, const ContactKeys& keys,
+                                                                         std::string*) {
+  return matching(keys, [&](const Contact& c) { return platform::contactMatchesName(c, name, "en_US"); });
 }
 
 platform::ImageBytes tinyPicture() {

@@ -3,6 +3,7 @@
 #include "platform/contacts/ContactStore.h"
 
 #include <atomic>
+#include <functional>
 #include <mutex>
 #include <vector>
 
@@ -12,25 +13,27 @@ namespace kyn::test {
 /// their canonical forms in the US agree, or as texts. Counts every query and keeps the last keys.
 class FakeContactStore final : public platform::ContactStore {
  public:
+  using Contacts = std::vector<std::shared_ptr<const platform::Contact>>;
+
   /// Adds a contact and returns it for further setting.
   platform::Contact& add(std::string identifier);
 
-  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingEmailAddress(
-      std::string_view emailAddress, const platform::ContactKeys& keys, std::string* error) override;
-  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingPhoneNumber(
-      std::string_view phoneNumber, const platform::ContactKeys& keys, std::string* error) override;
+  Contacts unifiedContactsMatchingEmailAddress(std::string_view emailAddress, const platform::ContactKeys& keys,
+                                               std::string* error) override;
+  Contacts unifiedContactsMatchingPhoneNumber(std::string_view phoneNumber, const platform::ContactKeys& keys,
+                                              std::string* error) override;
   std::shared_ptr<const platform::Contact> unifiedContactWithIdentifier(std::string_view identifier,
                                                                         const platform::ContactKeys& keys,
                                                                         std::string* error) override;
-
-  std::vector<std::shared_ptr<const platform::Contact>> unifiedContactsMatchingName(std::string_view name,
-                                                                                    const platform::ContactKeys& keys,
-                                                                                    std::string* error) override;
+  Contacts unifiedContactsMatchingName(std::string_view name, const platform::ContactKeys& keys,
+                                       std::string* error) override;
 
   std::atomic<int> queries{0};
   platform::ContactKeys lastKeys;
 
  private:
+  Contacts matching(const platform::ContactKeys& keys, const std::function<bool(const platform::Contact&)>& wanted);
+
   std::mutex mutex_;
   std::vector<platform::Contact> contacts_;
 };

@@ -1,11 +1,9 @@
 #include "support/Fakes.h"
 
-#include <sys/stat.h>
+#include "platform/net/JsonCommand.h"
 
 #include <chrono>
-#include <cstdlib>
 #include <fstream>
-#include <stdexcept>
 
 namespace kyn::test {
 
@@ -33,6 +31,29 @@ platform::Date utcDate(int year, int month, int day, int hour, int minute, doubl
   const double since1970 = static_cast<double>(days.time_since_epoch().count()) * 86400.0 + hour * 3600.0 +
                            minute * 60.0 + second;
   return since1970 - platform::kReferenceDateSince1970;
+}
+
+void postRedirect(const std::string& from, const std::optional<std::string>& to) {
+  auto command = std::make_shared<platform::KYJSONCommand>();
+  if (to) command->setRedirect(from, *to);
+  platform::services().notificationCenter().post({std::string(platform::KYCommandRedirectedNotification), command});
+}
+
+platform::Location fix(double latitude, double longitude, double accuracy, std::optional<platform::Date> timestamp) {
+  platform::Location l;
+  l.coordinate = {latitude, longitude};
+  l.horizontalAccuracy = accuracy;
+  l.timestamp = timestamp;
+  return l;
+}
+
+std::string vcard(std::string_view properties, std::string_view version) {
+  return "BEGIN:VCARD\r\nVERSION:" + std::string(version) + "\r\n" + std::string(properties) + "END:VCARD\r\n";
+}
+
+std::string readFile(const std::filesystem::path& file) {
+  std::ifstream in(file, std::ios::binary);
+  return std::string(std::istreambuf_iterator<char>(in), {});
 }
 
 std::optional<std::filesystem::path> sharedTestData(std::string_view subfolder) {

@@ -5,6 +5,7 @@
 #include "host/Process.h"
 #include "platform/Services.h"
 #include "platform/assistant/Model.h"
+#include "platform/location/Location.h"
 
 #include <atomic>
 #include <filesystem>
@@ -81,6 +82,19 @@ using host::TempDir;
 
 /// Seconds since 2001 for a UTC calendar date and time.
 [[nodiscard]] platform::Date utcDate(int year, int month, int day, int hour = 0, int minute = 0, double second = 0);
+
+/// Posts the redirect notification for a command sent to `from` (redirected to `to`, when given).
+void postRedirect(const std::string& from, const std::optional<std::string>& to);
+
+/// A platform location at this coordinate.
+[[nodiscard]] platform::Location fix(double latitude, double longitude, double accuracy = 0.0,
+                                     std::optional<platform::Date> timestamp = std::nullopt);
+
+/// One vCard with these property lines ("FN:Ada\r\n...").
+[[nodiscard]] std::string vcard(std::string_view properties, std::string_view version = "3.0");
+
+/// The whole content of a file; empty when it cannot be read.
+[[nodiscard]] std::string readFile(const std::filesystem::path& file);
 
 /// Folder of the outside test data, or nothing when it is not beside the project.
 [[nodiscard]] std::optional<std::filesystem::path> sharedTestData(std::string_view subfolder);

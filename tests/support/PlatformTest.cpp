@@ -1,9 +1,11 @@
 #include "support/PlatformTest.h"
 
 #include "account/Common.h"
-#include "platform/time/SystemTime.h"
-#include "platform/time/IcuDateFormatting.h"
+#include "datasource/KYNAXDataSource.h"
+#include "platform/locale/IcuLocaleInfo.h"
 #include "platform/localization/IcuLocalization.h"
+#include "platform/time/IcuDateFormatting.h"
+#include "platform/time/SystemTime.h"
 
 namespace kyn::test {
 
@@ -18,9 +20,12 @@ void PlatformTest::SetUp() {
   s.log().setMinimumLevel(platform::LogLevel::Debug);
 
   systemInfo = std::make_shared<FakeSystemInfo>();
+  systemInfo->signIn();
   session = std::make_shared<FakeSession>();
   clock = std::make_shared<FixedClock>(utcDate(2026, 11, 21, 15, 30, 0));
   assistant = std::make_shared<platform::AssistantPreferences>("en-US");
+  addressBook = std::make_shared<FakeContactStore>();
+  controller = std::make_shared<FakeController>();
   s.systemInfo.set(systemInfo);
   s.session.set(session);
   s.clock.set(clock);
@@ -28,6 +33,9 @@ void PlatformTest::SetUp() {
   s.numberFormatting.set(std::make_shared<platform::IcuNumberFormatting>("en_US"));
   s.dateFormatting.set(std::make_shared<platform::IcuDateFormatting>("en_US", "UTC"));
   s.assistantPreferences.set(assistant);
+  s.locale.set(std::make_shared<platform::IcuLocaleInfo>("en_US"));
+  s.contactStore.set(addressBook);
+  KYNAXDataSource::dataSource().setServerInteractionController(controller);
 
   Common::sharedInstance().clearKYNAccount();
   systemInfo->accountReads = 0;  // creating the shared instance read the account once
@@ -35,6 +43,7 @@ void PlatformTest::SetUp() {
 
 void PlatformTest::TearDown() {
   auto& s = platform::services();
+  KYNAXDataSource::dataSource().setServerInteractionController(nullptr);
   Common::sharedInstance().clearKYNAccount();
   s.log().setSink(previousSink_);
   s.log().setMinimumLevel(previousLevel_);

@@ -1,5 +1,7 @@
 #pragma once
 
+#include "support/FakeContactStore.h"
+#include "support/FakeController.h"
 #include "support/Fakes.h"
 
 #include <gtest/gtest.h>
@@ -8,9 +10,10 @@
 
 namespace kyn::test {
 
-/// Base fixture: a fresh configuration directory, every log line captured, a fixed clock in a fixed
-/// time zone, fake account and device facts, English as the assistant's language, and the account
-/// context's cached facts cleared. Restores the defaults afterwards.
+/// Base fixture: a fresh configuration directory, every log line captured, a fixed clock in UTC,
+/// en_US formats and locale, English as the assistant's language, a signed-in account, an empty
+/// address book in memory, and the data source sending through a fake controller. The account
+/// context's cached facts are cleared before and after. Restores the defaults afterwards.
 class PlatformTest : public ::testing::Test {
  protected:
   void SetUp() override;
@@ -25,6 +28,8 @@ class PlatformTest : public ::testing::Test {
   std::shared_ptr<FakeSession> session;
   std::shared_ptr<FixedClock> clock;
   std::shared_ptr<platform::AssistantPreferences> assistant;
+  std::shared_ptr<FakeContactStore> addressBook;
+  std::shared_ptr<FakeController> controller;
 
  private:
   std::shared_ptr<platform::LogSink> previousSink_;

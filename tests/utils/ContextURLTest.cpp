@@ -10,21 +10,18 @@ std::optional<std::string> urlFor(const char* json) {
   return KYNAXUtils::contextIdentifierURLForDictionary(&v);
 }
 
-TEST(ContextURL, TheTokenNeverGoesIntoTheURL) {
-  EXPECT_EQ(urlFor(R"({"authToken":"t","clientId":"abc"})"), "kynServerContext://serverContext?clientId=abc&");
+Value read(const std::string& query) {
+  return KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?" + query);
 }
 
-TEST(ContextURL, EmptyAndAbsentDictionaries) {
+TEST(ContextURL, PairsInOrderAsTheirTextWithoutTheToken) {
+  EXPECT_EQ(urlFor(R"({"authToken":"t","clientId":"abc"})"), "kynServerContext://serverContext?clientId=abc&");
+  EXPECT_EQ(urlFor(R"({"n":42,"f":2.5,"t":true,"no":false,"z":null})"),
+            "kynServerContext://serverContext?n=42&f=2.5&t=1&no=0&z=%3Cnull%3E&");
   EXPECT_EQ(urlFor("{}"), "kynServerContext://serverContext?");
   EXPECT_EQ(urlFor(R"({"authToken":"t"})"), "kynServerContext://serverContext?");
   EXPECT_FALSE(KYNAXUtils::contextIdentifierURLForDictionary(nullptr));
-  const Value notAnObject = Value::parse(R"(["a"])");
-  EXPECT_FALSE(KYNAXUtils::contextIdentifierURLForDictionary(&notAnObject));
-}
-
-TEST(ContextURL, ValuesAreWrittenInOrderAsTheirText) {
-  EXPECT_EQ(urlFor(R"({"n":42,"f":2.5,"t":true,"no":false,"z":null})"),
-            "kynServerContext://serverContext?n=42&f=2.5&t=1&no=0&z=%3Cnull%3E&");
+  EXPECT_FALSE(urlFor(R"(["a"])"));
 }
 
 TEST(ContextURL, RoundTripKeepsStringsWholeAndNarrowsNumbers) {
@@ -34,36 +31,26 @@ TEST(ContextURL, RoundTripKeepsStringsWholeAndNarrowsNumbers) {
   const auto url = KYNAXUtils::contextIdentifierURLForDictionary(&original);
   ASSERT_TRUE(url);
   EXPECT_EQ(url->find("secret"), std::string::npos);
-  const Value back = KYNAXUtils::contextDictionaryForURL(*url);
-  EXPECT_EQ(back, Value::parse(R"({
+  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL(*url), Value::parse(R"({
       "query":"a&b=c%d e+f","unicode key ✓":"Zürich 東京","n":42,"fraction":3,"big":2147483647,
       "neg":-7,"yes":1,"no":0,"numericText":12})"));
 }
 
-TEST(ContextURL, ReadingNumbersAndStrings) {
-  const Value d = KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?n=42&s=x&");
+TEST(ContextURL, Reading) {
+  const Value d = read("n=42&s=x&");
   EXPECT_EQ(d, Value::parse(R"({"n":42,"s":"x"})"));
   EXPECT_TRUE(d["n"].is_number_integer());
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?v=9999999999&")["v"], 2147483647);
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?v=-9999999999&")["v"], -2147483648);
-}
-
-TEST(ContextURL, MalformedPairsAreSkipped) {
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?a=1=2&b"), Value::object());
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?&&=&x=%zz&%=1&ok=%41&y=%E2%82&"),
-            Value::parse(R"({"":"","ok":"A"})"));
-}
-
-TEST(ContextURL, LaterKeysReplaceEarlierOnes) {
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?k=1&k=two&"),
-            Value::parse(R"({"k":"two"})"));
-}
-
-TEST(ContextURL, OnlyTheLengthOfThePrefixIsDropped) {
+  EXPECT_EQ(read("v=9999999999&")["v"], 2147483647);
+  EXPECT_EQ(read("v=-9999999999&")["v"], -2147483648);
+  EXPECT_EQ(read("k=1&k=two&"), Value::parse(R"({"k":"two"})"));  // a later key replaces an earlier one
+  // Malformed pairs are skipped.
+  EXPECT_EQ(read("a=1=2&b"), Value::object());
+  EXPECT_EQ(read("&&=&x=%zz&%=1&ok=%41&y=%E2%82&"), Value::parse(R"({"":"","ok":"A"})"));
+  // Only the length of the prefix is dropped, whatever it holds.
   EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("https://not-our-kind-of-url.test?k=v&"), Value::parse(R"({"k":"v"})"));
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://"), Value::object());
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL(""), Value::object());
-  EXPECT_EQ(KYNAXUtils::contextDictionaryForURL("kynServerContext://serverContext?"), Value::object());
+  for (const char* text : {"kynServerContext://", "", "kynServerContext://serverContext?"}) {
+    EXPECT_EQ(KYNAXUtils::contextDictionaryForURL(text), Value::object()) << text;
+  }
 }
 
 }  // namespace

@@ -7,20 +7,12 @@
 #include "support/PlatformTest.h"
 
 #include <algorithm>
-#include <fstream>
 #include <sstream>
 
 namespace kyn::platform {
 namespace {
 
 const ContactKeys kKeys = {std::string(ContactKey::FullNameFormatterKeys), std::string(ContactKey::ImageData)};
-
-std::string readAll(const std::filesystem::path& file) {
-  std::ifstream in(file, std::ios::binary);
-  std::ostringstream text;
-  text << in.rdbuf();
-  return text.str();
-}
 
 // Cards as a plain count of BEGIN:VCARD lines (the samples embed no cards in others).
 std::size_t countBeginLines(const std::string& text) {
@@ -50,16 +42,6 @@ std::optional<std::vector<std::filesystem::path>> sampleFiles() {
   return files;
 }
 
-// An ASCII text as UTF-16 with its byte-order mark.
-std::string asciiAsUtf16(std::string_view text, bool bigEndian) {
-  std::string bytes = bigEndian ? "\xFE\xFF" : "\xFF\xFE";
-  for (const char c : text) {
-    bytes += bigEndian ? '\0' : c;
-    bytes += bigEndian ? c : '\0';
-  }
-  return bytes;
-}
-
 using VCardExports = test::PlatformTest;  // keeps the log lines of the loads out of the output
 
 TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
@@ -71,7 +53,7 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
   std::size_t contacts = 0, named = 0, decodedPhotos = 0;
   for (const auto& file : files) {
     SCOPED_TRACE(file.filename().string());
-    const std::string text = readAll(file);
+    const std::string text = test::readFile(file);
     const VCardParseResult parsed = parseVCards(text, file.filename().string());
     EXPECT_TRUE(parsed.skipped.empty());
     EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
@@ -124,38 +106,6 @@ TEST_F(VCardExports, EveryContactIsFoundByEachOfItsAddressesAndNumbers) {
   EXPECT_GT(contacts, files.size() - 1);
   EXPECT_GT(named, contacts / 2);
   EXPECT_GT(decodedPhotos, 0u);
-}
-
-// The same files with a UTF-8 byte-order mark, and as UTF-16 in either byte order, read alike.
-TEST_F(VCardExports, ByteOrderMarksAndUtf16ChangeNothing) {
-  const auto samples = sampleFiles();
-  if (!samples) GTEST_SKIP() << "the shared test data (testdata/vcards beside the project) is not here";
-  const auto& files = *samples;
-  ASSERT_FALSE(files.empty());
-  const auto fields = [](const Contact& c) {
-    return std::tie(c.identifier, c.formattedName, c.givenName, c.familyName, c.organizationName, c.note,
-                    c.emailAddresses, c.phoneNumbers, c.postalAddresses);
-  };
-  for (const auto& file : files) {
-    const std::string text = readAll(file);
-    ASSERT_TRUE(std::all_of(text.begin(), text.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; }))
-        << file << " is no longer ASCII: asciiAsUtf16 cannot encode it";
-    const std::string name = file.filename().string();
-    const VCardParseResult plain = parseVCards(text, name);
-    const std::pair<const char*, std::string> variants[] = {{"UTF-8 with mark", "\xEF\xBB\xBF" + text},
-                                                            {"UTF-16LE", asciiAsUtf16(text, false)},
-                                                            {"UTF-16BE", asciiAsUtf16(text, true)}};
-    for (const auto& [encoding, variant] : variants) {
-      SCOPED_TRACE(name + " as " + encoding);
-      const VCardParseResult parsed = parseVCards(variant, name);
-      EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
-      ASSERT_EQ(parsed.contacts.size(), plain.contacts.size());
-      for (std::size_t i = 0; i < plain.contacts.size(); ++i) {
-        EXPECT_TRUE(fields(parsed.contacts[i]) == fields(plain.contacts[i])) << plain.contacts[i].identifier;
-        EXPECT_EQ(bool(parsed.contacts[i].imageData), bool(plain.contacts[i].imageData));
-      }
-    }
-  }
 }
 
 }  // namespace
