@@ -23,8 +23,8 @@ struct Case {
 // read on every call.
 TEST_F(PostalAddressTest, MailingAddressesByTheConventionsOfTheirCountry) {
   const Case cases[] = {
-      {"US: city and state in capitals", {"1 Infinite Loop", "Cupertino", "CA", "95014", "US"}, "en_US", "en-US",
-       "1 Infinite Loop\nCUPERTINO, CA 95014"},
+      {"US: city and state in capitals", {"1500 Harbor Road", "Portland", "OR", "97201", "US"}, "en_US", "en-US",
+       "1500 Harbor Road\nPORTLAND, OR 97201"},
       {"GB: no state line, foreign country named", {"10 Downing Street", "London", "England", "SW1A 2AA", "GB"},
        "en_US", "en-US", "10 Downing Street\nLONDON\nSW1A 2AA\nUnited Kingdom"},
       {"DE: lower-case code, postal code first", {"Unter den Linden 1", "Berlin", "BE", "10117", "de"}, "de_DE",
@@ -35,8 +35,8 @@ TEST_F(PostalAddressTest, MailingAddressesByTheConventionsOfTheirCountry) {
        "〒100-0001\n東京都千代田区\n千代田1-1"},
       {"JP: Latin-script layout", {"1-1 Chiyoda", "Chiyoda-ku", "Tokyo", "100-0001", "JP"}, "en_US", "fr-FR",
        "1-1 Chiyoda\nChiyoda-ku, TOKYO\n100-0001\nJapon"},
-      {"missing state: no stray separator", {"1 Infinite Loop", "Cupertino", {}, "95014", "US"}, "en_US", "en-US",
-       "1 Infinite Loop\nCUPERTINO 95014"},
+      {"missing state: no stray separator", {"1500 Harbor Road", "Portland", {}, "97201", "US"}, "en_US", "en-US",
+       "1500 Harbor Road\nPORTLAND 97201"},
       {"missing first field: no prefix, blank street", {" \t", "Zürich", {}, "", "CH"}, "de_CH", "de-CH", "Zürich"},
       {"street lines and whitespace", {"  221B  Baker Street \r\n\r\n Flat 1", "London", {}, "NW1 6XE", "GB"}, "en_GB",
        "en-GB", "221B Baker Street\nFlat 1\nLONDON\nNW1 6XE"},
