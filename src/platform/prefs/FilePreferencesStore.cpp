@@ -100,10 +100,17 @@ void removeStaleTemporaries(int dir, const std::string& fileName) {
     const std::string_view name(entry->d_name);
     if (name.size() != prefix.size() + 6 || !name.starts_with(prefix)) continue;
     const std::string_view suffix = name.substr(prefix.size());
-    const bool temporary = std::all_of(suffix.begin(), suffix.end(), [](char c) {
-      return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9');
-    });
-    if (temporary) ::unlinkat(dir, entry->d_name, 0);
+    // mkstemp's six random letters and digits; a plain lower-case word ("backup") is a user's file.
+    const auto lower = [](char c) { return c >= 'a' && c <= 'z'; };
+    const auto upperOrDigit = [](char c) { return (c >= 'A' && c <= 'Z') || (c >= '0' && c <= '9'); };
+    const bool random = std::all_of(suffix.begin(), suffix.end(), [&](char c) { return lower(c) || upperOrDigit(c); }) &&
+                        std::any_of(suffix.begin(), suffix.end(), upperOrDigit);
+    // mkstemp also made them regular files for the owner alone.
+    struct stat st {};
+    if (random && ::fstatat(dir, entry->d_name, &st, AT_SYMLINK_NOFOLLOW) == 0 && S_ISREG(st.st_mode) &&
+        (st.st_mode & 077) == 0) {
+      ::unlinkat(dir, entry->d_name, 0);
+    }
   }
   ::closedir(listing);
 }
@@ -196,7 +203,11 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
   const std::string lockName = fileName + ".lock";
   Fd staging(lockStagingFile(dir.get(), lockName));
   if (staging.get() < 0) return fail("lock");
-  removeStaleTemporaries(dir.get(), fileName);
+  // Earlier versions' temporaries can only be older than this process's first write.
+  if (!domain.swept) {
+    removeStaleTemporaries(dir.get(), fileName);
+    domain.swept = true;
+  }
 
   Value current = stampOf(file).exists ? readFile(file, false) : Value::object();
   for (auto& [key, value] : domain.pending) {

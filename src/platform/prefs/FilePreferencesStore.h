@@ -40,6 +40,7 @@ class FilePreferencesStore final : public PreferencesStore {
     std::optional<FileStamp> stamp;  // of the content below; nothing until first read
     Value content = Value::object();
     std::map<std::string, std::optional<Value>, std::less<>> pending;
+    bool swept = false;  // earlier versions' temporaries removed
   };
 
   static bool isValidDomain(std::string_view domain) noexcept;
