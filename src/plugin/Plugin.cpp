@@ -137,6 +137,8 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
   if (*className == AXKynGeoFenceSet::kClassName) {
     auto fence = std::make_shared<KYNAXSetGeoFence>();
     AXKynGeoFenceSet::readFields(*fence, *command);
+    // Without the flag the command would switch the fence off: refused rather than guessed.
+    if (!fence->enable) return reply->fail("The geofence command needs \"enable\": true or false");
     fence->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
     return;
   }

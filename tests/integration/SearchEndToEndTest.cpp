@@ -205,7 +205,11 @@ TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewH
 
 TEST_F(SearchEndToEnd, ACommandThatDoesNotParseIsAnsweredOnceAtOnce) {
   start();
-  for (const char* bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE"}) {
+  // A visibility or geofence command without its flag would hide the user or switch a fence off.
+  for (const char* bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE",
+                          R"({"class":"AXKynVisibilityStateSet"})",
+                          R"({"class":"AXKynGeoFenceSet","geoFenceTrigger":"OnArrival",)"
+                          R"("friend":{"class":"AXPerson","emails":[{"emailAddress":"ada@example.com"}]}})"}) {
     const auto outcome = plugin->perform(bad, std::chrono::seconds(1));
     EXPECT_EQ(outcome.replies, 1) << bad;
     ASSERT_TRUE(outcome.reply) << bad;
