@@ -64,10 +64,6 @@ std::string tokenFrom(const std::string& tokenFile) {
   throw kyn::sim::StartupError("no token: give --token-file or set KYN_SIM_TOKEN");
 }
 
-std::string urlHost(const std::string& address) {
-  return address.find(':') != std::string::npos ? "[" + address + "]" : address;
-}
-
 // `kyn-sim move`: a client of the running server's control path.
 int runMove(const std::string& controlFile, const std::string& handle, double latitude, double longitude,
          std::optional<double> accuracy) {
@@ -201,7 +197,7 @@ int main(int argc, char** argv) {
       ::kill(::getpid(), SIGTERM);
     }
   });
-  std::cout << "kyn-sim listening on https://" << urlHost(simulator->options().listen) << ':' << simulator->port()
+  std::cout << "kyn-sim listening on https://" << kyn::sim::urlHost(simulator->options().listen) << ':' << simulator->port()
             << std::endl;
 
   int signal = 0;

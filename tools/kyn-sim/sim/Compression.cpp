@@ -1,5 +1,7 @@
 #include "sim/Compression.h"
 
+#include "sim/DataSet.h"
+
 #include <zlib.h>
 
 #include <algorithm>
@@ -12,12 +14,6 @@ std::string_view trim(std::string_view s) {
   while (!s.empty() && (s.front() == ' ' || s.front() == '\t')) s.remove_prefix(1);
   while (!s.empty() && (s.back() == ' ' || s.back() == '\t')) s.remove_suffix(1);
   return s;
-}
-
-bool equalsIgnoringCase(std::string_view a, std::string_view b) {
-  return a.size() == b.size() && std::equal(a.begin(), a.end(), b.begin(), [](char x, char y) {
-           return std::tolower(static_cast<unsigned char>(x)) == std::tolower(static_cast<unsigned char>(y));
-         });
 }
 
 /// A q parameter of 0 (0, 0.0, 0.00, 0.000) refuses the coding.

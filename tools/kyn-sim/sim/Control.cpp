@@ -1,12 +1,7 @@
 #include "sim/Control.h"
 
 #include "sim/GetLocations.h"
-
-// The system's HTTP library is built with TLS, zlib and brotli support; see Simulator.cpp.
-#if !defined(CPPHTTPLIB_OPENSSL_SUPPORT) || !defined(CPPHTTPLIB_ZLIB_SUPPORT) || !defined(CPPHTTPLIB_BROTLI_SUPPORT)
-#error "build with the compile flags of pkg-config's cpp-httplib"
-#endif
-#include <httplib.h>
+#include "sim/Http.h"
 
 #include <array>
 #include <charconv>
@@ -35,11 +30,15 @@ X509_STORE* storeOf(const std::string& pem) {
   return added > 0 ? store.release() : nullptr;
 }
 
+}  // namespace
+
 std::string urlHost(const std::string& host) {
   return host.find(':') != std::string::npos ? "[" + host + "]" : host;
 }
 
-}  // namespace
+std::string controlUrl(const ControlAccess& access) {
+  return "https://" + urlHost(access.host) + ":" + std::to_string(access.port);
+}
 
 std::string makeControlSecret() {
   std::array<unsigned char, 32> bytes{};
@@ -56,7 +55,7 @@ std::string makeControlSecret() {
 }
 
 std::string controlFileText(const ControlAccess& access) {
-  const Json file = {{"url", "https://" + urlHost(access.host) + ":" + std::to_string(access.port)},
+  const Json file = {{"url", controlUrl(access)},
                      {"ca", access.caPem},
                      {"secret", access.secret}};
   return file.dump(2) + "\n";
@@ -126,7 +125,7 @@ ControlResult postControl(const ControlAccess& access, std::string_view path, co
   client.set_read_timeout(std::chrono::seconds(30));
   auto response = client.Post(std::string(path).c_str(), body.dump(), "application/json");
   if (!response) {
-    result.error = "no answer from https://" + urlHost(access.host) + ":" + std::to_string(access.port) + ": " +
+    result.error = "no answer from " + controlUrl(access) + ": " +
                    httplib::to_string(response.error());
     return result;
   }

@@ -25,6 +25,11 @@ struct ControlAccess {
   std::string secret;
 };
 
+/// A host as it stands in a URL: an IPv6 literal in brackets.
+[[nodiscard]] std::string urlHost(const std::string& host);
+/// The control path's base URL, https://HOST:PORT.
+[[nodiscard]] std::string controlUrl(const ControlAccess& access);
+
 /// A fresh random secret (64 hexadecimal digits).
 [[nodiscard]] std::string makeControlSecret();
 
