@@ -8,7 +8,7 @@ namespace kyn::platform {
 
 namespace {
 
-std::shared_ptr<Image> decode(std::span<const std::uint8_t> data) {
+std::shared_ptr<Image> decode(std::span<const std::uint8_t> data, bool keepPixels) {
   if (data.empty() || data.size() > static_cast<std::size_t>(INT_MAX)) return nullptr;
   const auto* bytes = reinterpret_cast<const stbi_uc*>(data.data());
   const int length = static_cast<int>(data.size());
@@ -22,19 +22,22 @@ std::shared_ptr<Image> decode(std::span<const std::uint8_t> data) {
   image->width = width;
   image->height = height;
   image->channels = channels;
-  image->pixels.assign(pixels, pixels + static_cast<std::size_t>(width) * static_cast<std::size_t>(height) *
-                                            static_cast<std::size_t>(channels));
+  if (keepPixels) {
+    image->pixels.assign(pixels, pixels + static_cast<std::size_t>(width) * static_cast<std::size_t>(height) *
+                                              static_cast<std::size_t>(channels));
+  }
   stbi_image_free(pixels);
   return image;
 }
 
 }  // namespace
 
-std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) { return decode(data); }
+std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data) { return decode(data, true); }
 
 std::shared_ptr<const Image> imageFromData(const ImageBytes& data) {
   if (!data) return nullptr;
-  auto image = decode(*data);
+  // Decoded only to know that it decodes and its size: whoever shows it gets the encoded bytes.
+  auto image = decode(*data, false);
   if (image) image->encoded = data;
   return image;
 }

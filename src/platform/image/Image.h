@@ -23,7 +23,8 @@ struct Image {
 /// Decodes JPEG, PNG, GIF, BMP and the other formats of stb_image. Nothing for data that does not
 /// decode or a picture larger than 100 megapixels.
 [[nodiscard]] std::shared_ptr<const Image> decodeImage(std::span<const std::uint8_t> data);
-/// The same, keeping `data` in the image as its encoded form.
+/// The same, keeping `data` in the image as its encoded form and no pixels (a picture handed on as
+/// the address book stores it needs only to decode and its size).
 [[nodiscard]] std::shared_ptr<const Image> imageFromData(const ImageBytes& data);
 
 }  // namespace kyn::platform
