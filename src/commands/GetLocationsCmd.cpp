@@ -71,7 +71,7 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
   const Value* locations = member(response, "locations");
   if (locations != nullptr && !locations->is_object()) locations = nullptr;  // null or the wrong type
   const Value* handlesToReport = member(response, "emails");
-  const bool incomplete = platform::int32Value(statusCode() ? &*statusCode() : nullptr) == 416;
+  const bool incomplete = platform::int32Value(statusCodeValue()) == 416;
   if (response == nullptr) return std::nullopt;
 
   std::vector<std::shared_ptr<AXKynLocation>> found;

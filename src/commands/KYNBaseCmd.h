@@ -37,6 +37,8 @@ class KYNBaseCmd : public platform::KYJSONCommand {
 
   /// "statusCode" of the last parsed response, as it came (a number or a numeric string).
   [[nodiscard]] const std::optional<Value>& statusCode() const noexcept { return statusCode_; }
+  /// The same as a pointer for the value readers: null when absent.
+  [[nodiscard]] const Value* statusCodeValue() const noexcept { return statusCode_ ? &*statusCode_ : nullptr; }
   void setStatusCode(std::optional<Value> code) { statusCode_ = std::move(code); }
   /// The server context of the last response as a context identifier URL.
   [[nodiscard]] const std::optional<std::string>& contextIdentifierURL() const noexcept { return contextIdentifierURL_; }

@@ -115,7 +115,7 @@ std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
   const Value* coordinates = fence;
   const Value* address = fullAddress;
   Value body;
-  if (!enable && !fence && !fullAddress && platform::int32Value(statusCode() ? &*statusCode() : nullptr) == 221) {
+  if (!enable && !fence && !fullAddress && platform::int32Value(statusCodeValue()) == 221) {
     body = jsonBodyDictionary();
     coordinates = memberNotNull(&body, "requestedLocation");
     address = memberNotNull(&body, "fullAddress");

@@ -48,7 +48,7 @@ std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command) {
   auto locations = command.result();
   log.notice("Result: %@", locations);
   if (command.wasSuccessful()) {
-    const std::int32_t status = platform::int32Value(command.statusCode() ? &*command.statusCode() : nullptr);
+    const std::int32_t status = platform::int32Value(command.statusCodeValue());
     if (status == 417) return AXCommandFailed::commandFailedWithErrorCode(AXKynNoFriendsErrorCode);
     if (status == 411) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotAFriendErrorCode);
     auto completed = AXKynSearchCompleted::searchCompleted();
@@ -88,7 +88,7 @@ std::shared_ptr<AXObject> visibilityReply(ShowHideLocationCmd& command) {
     // The result exists only for a parsed response; reading it also fills the status code.
     const auto result = command.result();
     log.notice("Result: %@", result);
-    const std::int32_t status = platform::int32Value(command.statusCode() ? &*command.statusCode() : nullptr);
+    const std::int32_t status = platform::int32Value(command.statusCodeValue());
     if (result && status > 0) {
       auto completed = AXKynVisibilitySetCompleted::visibilitySetCompleted();
       completed->searchContext = command.contextIdentifierURL();
@@ -129,7 +129,7 @@ std::shared_ptr<AXObject> geoFenceReply(SetGeoFenceCmd& command) {
   auto& log = services().log();
   // Reading the result parses the response and so fills the status code: it comes first.
   auto fence = command.result();
-  const std::int64_t status = platform::integerValue(command.statusCode() ? &*command.statusCode() : nullptr);
+  const std::int64_t status = platform::integerValue(command.statusCodeValue());
   log.notice("Server HTTP Status: %ld", status);
   log.notice("GeoFenceResult: %@", fence);
   const auto failed = [](std::int64_t code) { return AXCommandFailed::commandFailedWithErrorCode(code); };
