@@ -78,6 +78,10 @@ class AssistantCommand : public HostCommand {
 /// "LAT,LON" (when not empty). Throws UsageError for a coordinate that does not read.
 [[nodiscard]] Json namedPlace(Session& session, const std::string& label, const std::string& coordinate);
 
+/// A command's flag as the plug-in reads it: a boolean, or a number other than zero (a raw command
+/// may say 1).
+[[nodiscard]] bool flagOf(const Json& command, const char* key);
+
 /// Prints the reply to `command` for a person, in the assistant's language.
 void printReply(Session& session, const Json& command, const Json& reply, std::ostream& out);
 

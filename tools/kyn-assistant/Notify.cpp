@@ -175,8 +175,7 @@ void printGeoFence(Session& session, const Json& command, const Json& reply, std
   const Json& fence = memberOf(reply, "geoFence");
   std::string trigger = textOf(fence, "trigger");
   if (trigger.empty()) trigger = textOf(command, "geoFenceTrigger");
-  const Json& enable = memberOf(command, "enable");
-  const bool on = enable.is_boolean() ? enable.get<bool>() : enable.is_number() && enable.get<double>() != 0;
+  const bool on = flagOf(command, "enable");
   const bool them = textOf(command, "fenceType") != kNotifyMe;
   const std::string name = friendName(texts, command, fence), place = placeName(command, fence);
 

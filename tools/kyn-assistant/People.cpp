@@ -54,6 +54,11 @@ Json resolveFriend(Session& session, const std::string& who) {
   throw UsageError(message);
 }
 
+bool flagOf(const Json& command, const char* key) {
+  const Json flag = command.is_object() ? command.value(key, Json()) : Json();
+  return flag.is_boolean() ? flag.get<bool>() : flag.is_number() && flag.get<double>() != 0;
+}
+
 std::optional<Json> parseCoordinate(const std::string& text, bool allowAccuracy) {
   std::vector<double> parts;
   std::stringstream in(text);

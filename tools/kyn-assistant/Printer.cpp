@@ -131,10 +131,7 @@ void printReply(Session& session, const Json& command, const Json& reply, std::o
   } else if (kind == "AXKynSearchCompleted") {
     printSearch(session, command, reply, out);
   } else if (kind == "AXKynVisibilitySetCompleted") {
-    // As the plug-in reads the flag: a boolean, or a number other than zero (a raw command may say 1).
-    const Json flag = command.is_object() ? command.value("visible", Json()) : Json();
-    const bool visible = flag.is_boolean() ? flag.get<bool>() : flag.is_number() && flag.get<double>() != 0;
-    out << session.texts[visible ? Text::LocationShown : Text::LocationHidden] << "\n";
+    out << session.texts[flagOf(command, "visible") ? Text::LocationShown : Text::LocationHidden] << "\n";
   } else if (kind == "AXKynGeoFenceSetCompleted") {
     printGeoFence(session, command, reply, out);
   } else {
