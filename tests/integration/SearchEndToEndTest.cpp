@@ -259,11 +259,6 @@ TEST_F(SearchEndToEnd, ShuttingDownAnswersACommandInFlight) {
   EXPECT_LT(std::chrono::steady_clock::now() - started, std::chrono::seconds(10));
 }
 
-}  // namespace
-}  // namespace kyn::itest
-
-namespace kyn::itest {
-namespace {
 
 // A host may unload the plug-in and load it again in the same process; the libraries it uses (ICU,
 // curl) stay loaded meanwhile and must not keep pointers into the unloaded plug-in.
@@ -288,11 +283,6 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
   }
 }
 
-}  // namespace
-}  // namespace kyn::itest
-
-namespace kyn::itest {
-namespace {
 
 // The command-line host: a name found in the contacts, and an exit status for each kind of failure.
 TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
@@ -334,11 +324,6 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   EXPECT_EQ(german.output, "Du bist nicht bei Kyn angemeldet, oder der Server hat die Anmeldung nicht angenommen.\n");
 }
 
-}  // namespace
-}  // namespace kyn::itest
-
-namespace kyn::itest {
-namespace {
 
 // What a host shows of a friend beside the reply: the distance from where the user is, the time of
 // the fix, and the friend's picture as the address book stores it.
@@ -389,11 +374,6 @@ TEST(PluginPresentation, DistanceTimeAndPictureOfAFriend) {
   EXPECT_EQ(picture("[]", &size, nullptr, nullptr), nullptr);
 }
 
-}  // namespace
-}  // namespace kyn::itest
-
-namespace kyn::itest {
-namespace {
 
 // Signing in through the host: wrong input leaves the old account whole; the token is stored
 // owner-only and never shown; signing out ends the service.

@@ -72,6 +72,7 @@ TEST_F(GetLocationsTest, MatchUsesTheProximityRadius) {
   EXPECT_TRUE(matches(490, nullptr));
   EXPECT_FALSE(matches(510, nullptr));
   EXPECT_FALSE(matches(510, "around"));
+  EXPECT_TRUE(matches(490, "AT"));  // the protocol's words are lower case: an unknown word
   // No requested place: no match, even right beside the friend.
   EXPECT_FALSE(ask(Json{{"handles", {"ada@example.com"}}, {"myLocation", at(45, -122)}})["locations"]
                    ["ada@example.com"]["match"]);

@@ -77,12 +77,8 @@ TEST(RouterTest, ErrorsOfAuthorisationPathMethodAndBody) {
 }
 
 TEST(RouterTest, FaultsAsWrittenOnTheCommandLine) {
-  EXPECT_EQ(parseFault("status:503").status, 503);
-  EXPECT_EQ(parseFault("slow:250").delay, std::chrono::milliseconds(250));
+  // A body path may hold a colon.
   EXPECT_EQ(parseFault("body:/tmp/a:b.json").bodyPath, "/tmp/a:b.json");
-  EXPECT_EQ(parseFault("reset").kind, Fault::Kind::Reset);
-  EXPECT_EQ(parseFault("garbage").kind, Fault::Kind::Garbage);
-  EXPECT_EQ(parseFault("truncate").kind, Fault::Kind::Truncate);
   EXPECT_EQ(parseFault("status:500").describe(), "status:500");
   for (const char* bad : {"status", "status:", "status:99", "status:600", "status:5x", "slow:-1", "slow", "body:",
                           "reset:1", "crash"}) {
