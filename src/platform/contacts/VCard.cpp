@@ -10,6 +10,7 @@
 #include <cstdint>
 #include <map>
 #include <memory>
+#include <new>
 #include <optional>
 #include <stdexcept>
 #include <string>
@@ -983,46 +984,24 @@ class CardReader {
 
 // UTF-16 text as UTF-8; an unpaired surrogate or a last odd byte becomes U+FFFD and is counted.
 std::string utf8FromUtf16(std::string_view bytes, bool bigEndian, std::size_t& invalid) {
-  const auto unit = [&](std::size_t i) -> char32_t {
+  const auto units = static_cast<int32_t>(bytes.size() / 2);
+  icu::UnicodeString text;
+  char16_t* buffer = text.getBuffer(units);
+  if (buffer == nullptr) throw std::bad_alloc();
+  for (int32_t i = 0; i < units; ++i) {
     const auto first = static_cast<unsigned char>(bytes[2 * i]);
     const auto second = static_cast<unsigned char>(bytes[2 * i + 1]);
-    return bigEndian ? (char32_t{first} << 8) | second : (char32_t{second} << 8) | first;
-  };
-  const auto append = [](std::string& out, char32_t c) {
-    if (c < 0x80) {
-      out.push_back(static_cast<char>(c));
-    } else if (c < 0x800) {
-      out.push_back(static_cast<char>(0xC0 | (c >> 6)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    } else if (c < 0x10000) {
-      out.push_back(static_cast<char>(0xE0 | (c >> 12)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    } else {
-      out.push_back(static_cast<char>(0xF0 | (c >> 18)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 12) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | ((c >> 6) & 0x3F)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    }
-  };
-  const std::size_t units = bytes.size() / 2;
-  std::string out;
-  out.reserve(units + units / 2);
-  for (std::size_t i = 0; i < units; ++i) {
-    char32_t c = unit(i);
-    if (c >= 0xD800 && c <= 0xDBFF && i + 1 < units && unit(i + 1) >= 0xDC00 && unit(i + 1) <= 0xDFFF) {
-      c = 0x10000 + ((c - 0xD800) << 10) + (unit(++i) - 0xDC00);
-    } else if (c >= 0xD800 && c <= 0xDFFF) {
-      c = 0xFFFD;
-      ++invalid;
-    }
-    append(out, c);
+    buffer[i] = static_cast<char16_t>(bigEndian ? (first << 8) | second : (second << 8) | first);
+  }
+  text.releaseBuffer(units);
+  for (int32_t i = 0; i < text.length(); i = text.moveIndex32(i, 1)) {
+    if (U_IS_SURROGATE(text.char32At(i))) ++invalid;  // a pair reads as one supplementary character
   }
   if (bytes.size() % 2 != 0) {
-    append(out, 0xFFFD);
+    text.append(char16_t{0xFFFD});
     ++invalid;
   }
-  return out;
+  return utf8FromUnicode(text);
 }
 
 enum class TextEncoding { Utf8, Utf16LittleEndian, Utf16BigEndian };
