@@ -2,6 +2,7 @@
 
 #include <simdjson.h>
 
+#include <charconv>
 #include <cmath>
 #include <deque>
 #include <memory>
@@ -211,7 +212,103 @@ std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) 
   return builder.take();
 }
 
+/// Whether `text` is well-formed UTF-8 (no overlong forms, surrogates or code points past U+10FFFF).
+bool isValidUtf8(std::string_view text) noexcept {
+  const auto* p = reinterpret_cast<const unsigned char*>(text.data());
+  const auto* end = p + text.size();
+  auto continuation = [&](const unsigned char* at, unsigned char low, unsigned char high) {
+    return at < end && *at >= low && *at <= high;
+  };
+  while (p < end) {
+    const unsigned char c = *p;
+    if (c < 0x80) {
+      ++p;
+      continue;
+    }
+    // The second byte's range depends on the first; every later byte is 80..BF.
+    unsigned char low = 0x80;
+    unsigned char high = 0xBF;
+    int length = 0;
+    if (c >= 0xC2 && c <= 0xDF) {
+      length = 2;
+    } else if (c >= 0xE0 && c <= 0xEF) {
+      length = 3;
+      if (c == 0xE0) low = 0xA0;
+      if (c == 0xED) high = 0x9F;
+    } else if (c >= 0xF0 && c <= 0xF4) {
+      length = 4;
+      if (c == 0xF0) low = 0x90;
+      if (c == 0xF4) high = 0x8F;
+    } else {
+      return false;
+    }
+    if (!continuation(p + 1, low, high)) return false;
+    for (int i = 2; i < length; ++i) {
+      if (!continuation(p + i, 0x80, 0xBF)) return false;
+    }
+    p += length;
+  }
+  return true;
+}
+
 }  // namespace
+
+void appendJsonString(std::string& out, std::string_view text) {
+  const std::size_t start = out.size();
+  out += '"';
+  bool checked = false;  // the whole text has been found to be valid UTF-8
+  std::size_t run = 0;   // where the characters not yet written begin
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const auto c = static_cast<unsigned char>(text[i]);
+    if (c >= 0x80) {
+      if (checked) continue;
+      if (!isValidUtf8(text.substr(i))) {
+        // Rare: the library's own writer decides how each bad byte is replaced.
+        out.resize(start);
+        out += Value(std::string(text)).dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+        return;
+      }
+      checked = true;
+      continue;
+    }
+    if (c >= 0x20 && c != '"' && c != '\\') continue;
+    out.append(text.data() + run, i - run);
+    run = i + 1;
+    switch (c) {
+      case '"': out += "\\\""; break;
+      case '\\': out += "\\\\"; break;
+      case '\b': out += "\\b"; break;
+      case '\f': out += "\\f"; break;
+      case '\n': out += "\\n"; break;
+      case '\r': out += "\\r"; break;
+      case '\t': out += "\\t"; break;
+      default: {
+        static constexpr char kHex[] = "0123456789abcdef";
+        const char escaped[] = {'\\', 'u', '0', '0', kHex[c >> 4], kHex[c & 0xF]};
+        out.append(escaped, sizeof escaped);
+      }
+    }
+  }
+  out.append(text.data() + run, text.size() - run);
+  out += '"';
+}
+
+void appendJsonNumber(std::string& out, double value) {
+  if (!std::isfinite(value)) {
+    out += "null";
+    return;
+  }
+  // The library's own shortest form, so that the text is the one `toJson` writes.
+  char buffer[64];
+  const char* end = nlohmann::detail::to_chars(buffer, buffer + sizeof buffer, value);
+  out.append(buffer, static_cast<std::size_t>(end - buffer));
+}
+
+void appendJsonNumber(std::string& out, std::int64_t value) {
+  char buffer[24];
+  const auto result = std::to_chars(buffer, buffer + sizeof buffer, value);
+  out.append(buffer, static_cast<std::size_t>(result.ptr - buffer));
+}
 
 std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept {
   if (text.size() > limits.maxBytes) return std::nullopt;

@@ -3,6 +3,7 @@
 #include "platform/value/Value.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -22,5 +23,14 @@ struct JsonLimits {
 
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
+
+// Pieces of JSON text for writers that do without a Value: each appends exactly what `toJson`
+// writes for the same string or number.
+
+/// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
+void appendJsonString(std::string& out, std::string_view text);
+/// A number; "null" for NaN and infinity.
+void appendJsonNumber(std::string& out, double value);
+void appendJsonNumber(std::string& out, std::int64_t value);
 
 }  // namespace kyn::platform
