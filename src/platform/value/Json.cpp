@@ -295,6 +295,22 @@ bool isValidUtf8(std::string_view text) noexcept {
 
 }  // namespace
 
+void releaseValue(Value& value) noexcept {
+  if (value.is_array()) {
+    auto& items = value.get_ref<Value::array_t&>();
+    for (Value& item : items) {
+      if (item.is_structured()) releaseValue(item);
+    }
+    items.clear();
+  } else if (value.is_object()) {
+    auto& members = static_cast<Value::object_t::Container&>(value.get_ref<Value::object_t&>());
+    for (auto& member : members) {
+      if (member.second.is_structured()) releaseValue(member.second);
+    }
+    members.clear();
+  }
+}
+
 void appendJsonString(std::string& out, std::string_view text) {
   const std::size_t start = out.size();
   out += '"';

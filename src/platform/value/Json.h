@@ -24,6 +24,11 @@ struct JsonLimits {
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
 
+/// Empties `value` from its leaves up, for a value about to go: the library's own teardown moves
+/// every member of each nested value through a stack it allocates, which costs more than the
+/// building did. Recursion is as deep as the value (parsed values are bounded by JsonLimits).
+void releaseValue(Value& value) noexcept;
+
 // Pieces of JSON text for writers that do without a Value: each appends exactly what `toJson`
 // writes for the same string or number.
 
