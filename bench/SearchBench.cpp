@@ -111,7 +111,7 @@ class AnsweringController final : public platform::KYServerInteractionController
 /// Performs a command in this process as the C interface does: parse, dispatch, reply as text.
 std::string performHere(const std::string& commandJson) {
   std::string text;
-  auto reply = [&](const Value& r) { text = platform::toJson(r); };
+  auto reply = [&](const AXReply& r) { text = r.json(); };
   const auto command = platform::parseJson(commandJson).value();
   const std::string className = command["class"].get<std::string>();
   if (className == AXKynSearch::kClassName) {

@@ -32,15 +32,17 @@ template <class Command, class Mapping>
       Command& command;
       ~ClearOnExit() { command.setCompletionBlock(nullptr); }
     } clear{*command};
-    std::optional<Value> reply;
+    std::shared_ptr<AXObject> reply;
     try {
-      reply = mapping(*command)->dictionary();
+      reply = mapping(*command);
     } catch (const std::exception& e) {
       platform::services().log().error("The reply to %@ could not be made: %@", command->description(), e.what());
     } catch (...) {
       platform::services().log().error("The reply to %@ could not be made", command->description());
     }
-    if (completion) completion(reply ? *reply : serviceNotAvailableReply());
+    if (!completion) return;
+    if (reply) completion(AXReply(std::move(reply)));
+    else completion(AXReply(serviceNotAvailableReply()));
   };
 }
 

@@ -33,7 +33,7 @@ std::shared_ptr<AXCommandFailed> KYNAXSearch::_validate() {
 void KYNAXSearch::performWithCompletion(AXCompletion completion) {
   services().log().notice("search: %@", *this);
   if (auto failure = _validate()) {
-    if (completion) completion(failure->dictionary());
+    if (completion) completion(failure);
     return;
   }
   KYNAXDataSource::dataSource().search(*this, std::move(completion));

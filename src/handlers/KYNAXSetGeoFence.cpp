@@ -17,7 +17,7 @@ std::shared_ptr<AXCommandFailed> KYNAXSetGeoFence::_validate() {
 void KYNAXSetGeoFence::performWithCompletion(AXCompletion completion) {
   platform::services().log().notice("search: %@", *this);
   if (auto failure = _validate()) {
-    if (completion) completion(failure->dictionary());
+    if (completion) completion(failure);
     return;
   }
   KYNAXDataSource::dataSource().setGeoFence(*this, std::move(completion));

@@ -34,7 +34,7 @@ void KYNAXVisibility::performWithCompletion(AXCompletion completion) {
   auto failure = _validate();
   services().log().notice("KYNAXVisibility performWithCompletion %@", failure);
   if (failure) {
-    if (completion) completion(failure->dictionary());
+    if (completion) completion(failure);
     return;
   }
   KYNAXDataSource::dataSource().setVisibility(*this, std::move(completion));

@@ -33,15 +33,18 @@ class ReplyOnce {
  public:
   ReplyOnce(kyn_reply_callback callback, void* context) : callback_(callback), context_(context) {}
 
-  void deliver(const Value& reply) noexcept {
+  void deliver(const AXReply& reply) noexcept {
     if (delivered_.exchange(true)) {
-      services().log().error("A second reply to one command was dropped: %@", reply);
+      try {
+        services().log().error("A second reply to one command was dropped: %@", reply.json());
+      } catch (...) {
+      }
       return;
     }
     try {
       std::string text;
       try {
-        text = platform::toJson(reply);
+        text = reply.json();
       } catch (...) {
         // No memory for the text: the assistant still gets its one reply.
         return callback_(kInternalErrorReply, context_);
@@ -55,7 +58,7 @@ class ReplyOnce {
   void fail(std::string reason) noexcept {
     try {
       services().log().error("Command refused: %@", reason);
-      deliver(AXCommandFailed::commandFailedWithReason(std::move(reason))->dictionary());
+      deliver(AXCommandFailed::commandFailedWithReason(std::move(reason)));
     } catch (...) {
       deliver(Value{{"class", "AXCommandFailed"}, {"reason", "Internal error"}});
     }
@@ -123,7 +126,7 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
   if (*className == AXKynSearch::kClassName) {
     auto search = std::make_shared<KYNAXSearch>();
     AXKynSearch::readFields(*search, *command);
-    search->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    search->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
     return;
   }
   if (*className == AXKynVisibilityStateSet::kClassName) {
@@ -131,7 +134,7 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
     AXKynVisibilityStateSet::readFields(*visibility, *command);
     // Without the flag the command would read as "hide": refused rather than guessed.
     if (!visibility->visible) return reply->fail("The visibility command needs \"visible\": true or false");
-    visibility->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    visibility->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
     return;
   }
   if (*className == AXKynGeoFenceSet::kClassName) {
@@ -139,7 +142,7 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
     AXKynGeoFenceSet::readFields(*fence, *command);
     // Without the flag the command would switch the fence off: refused rather than guessed.
     if (!fence->enable) return reply->fail("The geofence command needs \"enable\": true or false");
-    fence->performWithCompletion([reply](const Value& dictionary) { reply->deliver(dictionary); });
+    fence->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
     return;
   }
   reply->fail("Unknown command class: " + *className);

@@ -3,6 +3,13 @@
 #include "platform/value/Json.h"
 
 namespace kyn {
+namespace {
+
+/// Room made for a reply's text at once: most replies fit, and a larger one grows from there in a
+/// few steps rather than many.
+constexpr std::size_t kReplyTextReserve = 4096;
+
+}  // namespace
 
 std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept {
   switch (code) {
@@ -21,7 +28,17 @@ std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept {
 }
 
 std::string AXObject::description() const {
-  return "<" + std::string(className()) + " " + platform::toJson(dictionary()) + ">";
+  std::string text = "<" + std::string(className()) + " ";
+  appendJson(text);
+  return text + ">";
+}
+
+std::string AXReply::json() const {
+  if (dictionary_ || !record_) return platform::toJson(dictionary());
+  std::string text;
+  text.reserve(kReplyTextReserve);
+  record_->appendJson(text);
+  return text;
 }
 
 std::shared_ptr<AXCommandFailed> AXCommandFailed::commandFailedWithErrorCode(std::int64_t code) {

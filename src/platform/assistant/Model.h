@@ -6,6 +6,7 @@
 // absent fields left out and nested records as nested dictionaries (README, "Reply dictionaries").
 
 #include "platform/core/Object.h"
+#include "platform/value/Json.h"
 #include "platform/value/Value.h"
 
 #include <cmath>
@@ -15,6 +16,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <type_traits>
 #include <vector>
 
 namespace kyn {
@@ -51,6 +53,9 @@ class AXObject : public platform::Object {
  public:
   [[nodiscard]] virtual std::string_view className() const = 0;
   [[nodiscard]] virtual Value dictionary() const = 0;
+  /// Appends the dictionary as JSON text, written from the fields without making the dictionary:
+  /// the same text as `toJson(dictionary())`.
+  virtual void appendJson(std::string& out) const = 0;
   /// "<ClassName {dictionary}>"
   [[nodiscard]] std::string description() const override;
 };
@@ -96,6 +101,58 @@ struct FieldWriter {
       if (item) array.push_back(item->dictionary());
     }
     out.emplace_back(key, std::move(array));
+  }
+};
+
+/// Writes present fields as JSON text by the rules of FieldWriter. Each follows the "class" member,
+/// hence the leading comma; the keys are plain identifiers and need no escaping.
+struct FieldJsonWriter {
+  std::string& out;
+
+  void key(const char* key) const {
+    out += ",\"";
+    out += key;
+    out += "\":";
+  }
+  void operator()(const char* k, const std::optional<std::string>& v) const {
+    if (!v) return;
+    key(k);
+    platform::appendJsonString(out, *v);
+  }
+  void operator()(const char* k, const std::optional<double>& v) const {
+    if (!v || !std::isfinite(*v)) return;
+    key(k);
+    platform::appendJsonNumber(out, *v);
+  }
+  void operator()(const char* k, const std::optional<bool>& v) const {
+    if (!v) return;
+    key(k);
+    out += *v ? "true" : "false";
+  }
+  void operator()(const char* k, const std::optional<std::int64_t>& v) const {
+    if (!v) return;
+    key(k);
+    platform::appendJsonNumber(out, *v);
+  }
+  template <class T>
+  void operator()(const char* k, const std::shared_ptr<T>& v) const {
+    if (!v) return;
+    key(k);
+    v->appendJson(out);
+  }
+  template <class T>
+  void operator()(const char* k, const AXArray<T>& v) const {
+    if (!v) return;
+    key(k);
+    out += '[';
+    bool first = true;
+    for (const auto& item : *v) {
+      if (!item) continue;
+      if (!first) out += ',';
+      first = false;
+      item->appendJson(out);
+    }
+    out += ']';
   }
 };
 
@@ -152,6 +209,15 @@ class AXRecord : public AXObject {
     detail::FieldWriter writer{members};
     Derived::fields(static_cast<const Derived&>(*this), writer);
     return out;
+  }
+
+  void appendJson(std::string& out) const override {
+    out += "{\"class\":\"";
+    out += Derived::kClassName;  // a plain identifier
+    out += '"';
+    detail::FieldJsonWriter writer{out};
+    Derived::fields(static_cast<const Derived&>(*this), writer);
+    out += '}';
   }
 
   /// Fills `into` from a dictionary of this record's layout.
@@ -416,7 +482,30 @@ class AXKynGeoFenceSetCompleted : public AXRecord<AXKynGeoFenceSetCompleted> {
   }
 };
 
-/// The assistant's completion: called once with the reply's dictionary.
-using AXCompletion = std::function<void(const Value& reply)>;
+/// A reply as the assistant receives it: a record, or a dictionary made some other way. A record's
+/// text is written straight from its fields, and its dictionary is made only when asked for (once;
+/// a reply belongs to one completion, on one thread).
+class AXReply {
+ public:
+  template <class T, class = std::enable_if_t<std::is_base_of_v<AXObject, T>>>
+  AXReply(std::shared_ptr<T> record) : record_(std::move(record)) {}  // NOLINT: a record is a reply
+  AXReply(Value dictionary) : dictionary_(std::move(dictionary)) {}   // NOLINT: so is a dictionary
+
+  [[nodiscard]] const Value& dictionary() const {
+    if (!dictionary_) dictionary_ = record_ ? record_->dictionary() : Value();
+    return *dictionary_;
+  }
+  operator const Value&() const { return dictionary(); }  // NOLINT: a reply reads as its dictionary
+
+  /// The reply as JSON text, the same as `toJson(dictionary())`.
+  [[nodiscard]] std::string json() const;
+
+ private:
+  std::shared_ptr<const AXObject> record_;
+  mutable std::optional<Value> dictionary_;
+};
+
+/// The assistant's completion: called once with the reply.
+using AXCompletion = std::function<void(const AXReply& reply)>;
 
 }  // namespace kyn

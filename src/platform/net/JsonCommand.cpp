@@ -22,6 +22,10 @@ std::string_view describeTransferError(KYTransferError error) noexcept {
   return "unknown failure";
 }
 
+KYJSONCommand::~KYJSONCommand() {
+  if (parsedResponse_) releaseValue(*parsedResponse_);
+}
+
 std::string KYJSONCommand::path() const { return "/"; }
 
 Value KYJSONCommand::headers() const { return Value::object(); }
@@ -40,6 +44,7 @@ const Value* KYJSONCommand::jsonResponseDictionary() {
 double KYJSONCommand::minCallbackInterval() { return 0.0; }
 
 void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& limits) {
+  if (parsedResponse_) releaseValue(*parsedResponse_);
   auto parsed = parseJson(body, limits);
   if (parsed && parsed->is_object()) parsedResponse_ = std::move(parsed);
   else parsedResponse_.reset();

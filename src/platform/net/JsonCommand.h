@@ -45,7 +45,7 @@ enum class KYTransferError {
 class KYJSONCommand : public Object {
  public:
   KYJSONCommand() = default;
-  ~KYJSONCommand() override = default;
+  ~KYJSONCommand() override;
   KYJSONCommand(const KYJSONCommand&) = delete;
   KYJSONCommand& operator=(const KYJSONCommand&) = delete;
 

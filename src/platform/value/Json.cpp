@@ -2,6 +2,7 @@
 
 #include <simdjson.h>
 
+#include <charconv>
 #include <cmath>
 #include <deque>
 #include <memory>
@@ -141,48 +142,90 @@ class Builder {
   std::deque<Members> members_;  // by depth; a deque, so that growing it moves none
 };
 
-/// Hands a document that simdjson has read to `builder` as the events of nlohmann's parser, so that
-/// both readings follow the same rules.
-bool replay(simdjson::dom::element element, Builder& builder) {
-  using simdjson::dom::element_type;
-  switch (element.type()) {
-    case element_type::ARRAY: {
-      const simdjson::dom::array array = element.get_array().value_unsafe();
-      if (!builder.start_array(array.size())) return false;
-      for (const simdjson::dom::element item : array) {
-        if (!replay(item, builder)) return false;
+/// Makes the Value of a document that simdjson has read, by the rules of Builder: the nesting depth
+/// bounded, non-finite numbers refused, of duplicate keys the last value at the position of the
+/// first. Each container is made at its final size, so nothing it holds is moved again; keys are
+/// compared and indexed as views into simdjson's document, which lives as long as this does.
+class Converter {
+ public:
+  explicit Converter(std::size_t maxDepth) : maxDepth_(maxDepth) {}
+
+  /// False when the document breaks a rule; `out` is then unspecified.
+  bool convert(simdjson::dom::element element, Value& out, std::size_t depth = 0) {
+    using simdjson::dom::element_type;
+    switch (element.type()) {
+      case element_type::ARRAY: {
+        if (depth >= maxDepth_) return false;
+        const simdjson::dom::array array = element.get_array().value_unsafe();
+        out = Value::array();
+        auto& items = out.get_ref<Value::array_t&>();
+        items.reserve(array.size());
+        for (const simdjson::dom::element item : array) {
+          if (!convert(item, items.emplace_back(), depth + 1)) return false;
+        }
+        return true;
       }
-      return builder.end_array();
-    }
-    case element_type::OBJECT: {
-      const simdjson::dom::object object = element.get_object().value_unsafe();
-      if (!builder.start_object(object.size())) return false;
-      for (const simdjson::dom::key_value_pair member : object) {
-        std::string key(member.key);
-        if (!builder.key(key) || !replay(member.value, builder)) return false;
+      case element_type::OBJECT: {
+        if (depth >= maxDepth_) return false;
+        const simdjson::dom::object object = element.get_object().value_unsafe();
+        out = Value::object();
+        auto& members = static_cast<Value::object_t::Container&>(out.get_ref<Value::object_t&>());
+        const std::size_t size = object.size();
+        members.reserve(size);
+        std::unordered_map<std::string_view, std::size_t> index;  // for large objects only
+        if (size > kIndexThreshold) index.reserve(size);
+        for (const simdjson::dom::key_value_pair member : object) {
+          std::size_t at = members.size();
+          if (size > kIndexThreshold) {
+            const auto [it, added] = index.emplace(member.key, at);
+            if (!added) at = it->second;
+          } else {
+            for (std::size_t i = 0; i < members.size(); ++i) {
+              if (members[i].first == member.key) {
+                at = i;
+                break;
+              }
+            }
+          }
+          if (at == members.size()) members.emplace_back(std::string(member.key), Value());
+          Value& slot = members[at].second;
+          slot = Value();  // a repeated key's value is replaced as a whole
+          if (!convert(member.value, slot, depth + 1)) return false;
+        }
+        return true;
       }
-      return builder.end_object();
+      case element_type::STRING:
+        out = Value(std::string(element.get_string().value_unsafe()));
+        return true;
+      case element_type::INT64: {
+        // nlohmann keeps every non-negative integer unsigned.
+        const std::int64_t v = element.get_int64().value_unsafe();
+        out = v >= 0 ? Value(static_cast<Value::number_unsigned_t>(v)) : Value(static_cast<Value::number_integer_t>(v));
+        return true;
+      }
+      case element_type::UINT64:
+        out = Value(static_cast<Value::number_unsigned_t>(element.get_uint64().value_unsafe()));
+        return true;
+      case element_type::DOUBLE: {
+        const double v = element.get_double().value_unsafe();
+        if (!std::isfinite(v)) return false;
+        out = Value(static_cast<Value::number_float_t>(v));
+        return true;
+      }
+      case element_type::BOOL:
+        out = Value(element.get_bool().value_unsafe());
+        return true;
+      case element_type::NULL_VALUE:
+        out = Value(nullptr);
+        return true;
     }
-    case element_type::STRING: {
-      std::string text(element.get_string().value_unsafe());
-      return builder.string(text);
-    }
-    case element_type::INT64: {
-      // nlohmann keeps every non-negative integer unsigned.
-      const std::int64_t v = element.get_int64().value_unsafe();
-      return v >= 0 ? builder.number_unsigned(static_cast<Value::number_unsigned_t>(v)) : builder.number_integer(v);
-    }
-    case element_type::UINT64:
-      return builder.number_unsigned(element.get_uint64().value_unsafe());
-    case element_type::DOUBLE:
-      return builder.number_float(element.get_double().value_unsafe(), std::string());
-    case element_type::BOOL:
-      return builder.boolean(element.get_bool().value_unsafe());
-    case element_type::NULL_VALUE:
-      return builder.null();
+    return false;
   }
-  return false;
-}
+
+ private:
+  static constexpr std::size_t kIndexThreshold = 16;
+  std::size_t maxDepth_;
+};
 
 /// Texts up to this size are read by a parser kept per thread, which keeps its buffers (about
 /// fourteen bytes per byte of text); a larger one gets a parser of its own, so that one large
@@ -206,12 +249,124 @@ std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) 
   }
   simdjson::dom::element root;
   if (parser->parse(text.data(), text.size()).get(root) != simdjson::SUCCESS) return std::nullopt;
-  Builder builder(limits.maxDepth);
-  if (!replay(root, builder)) return std::nullopt;
-  return builder.take();
+  Value value;
+  if (!Converter(limits.maxDepth).convert(root, value)) return std::nullopt;
+  return value;
+}
+
+/// Whether `text` is well-formed UTF-8 (no overlong forms, surrogates or code points past U+10FFFF).
+bool isValidUtf8(std::string_view text) noexcept {
+  const auto* p = reinterpret_cast<const unsigned char*>(text.data());
+  const auto* end = p + text.size();
+  auto continuation = [&](const unsigned char* at, unsigned char low, unsigned char high) {
+    return at < end && *at >= low && *at <= high;
+  };
+  while (p < end) {
+    const unsigned char c = *p;
+    if (c < 0x80) {
+      ++p;
+      continue;
+    }
+    // The second byte's range depends on the first; every later byte is 80..BF.
+    unsigned char low = 0x80;
+    unsigned char high = 0xBF;
+    int length = 0;
+    if (c >= 0xC2 && c <= 0xDF) {
+      length = 2;
+    } else if (c >= 0xE0 && c <= 0xEF) {
+      length = 3;
+      if (c == 0xE0) low = 0xA0;
+      if (c == 0xED) high = 0x9F;
+    } else if (c >= 0xF0 && c <= 0xF4) {
+      length = 4;
+      if (c == 0xF0) low = 0x90;
+      if (c == 0xF4) high = 0x8F;
+    } else {
+      return false;
+    }
+    if (!continuation(p + 1, low, high)) return false;
+    for (int i = 2; i < length; ++i) {
+      if (!continuation(p + i, 0x80, 0xBF)) return false;
+    }
+    p += length;
+  }
+  return true;
 }
 
 }  // namespace
+
+void releaseValue(Value& value) noexcept {
+  if (value.is_array()) {
+    auto& items = value.get_ref<Value::array_t&>();
+    for (Value& item : items) {
+      if (item.is_structured()) releaseValue(item);
+    }
+    items.clear();
+  } else if (value.is_object()) {
+    auto& members = static_cast<Value::object_t::Container&>(value.get_ref<Value::object_t&>());
+    for (auto& member : members) {
+      if (member.second.is_structured()) releaseValue(member.second);
+    }
+    members.clear();
+  }
+}
+
+void appendJsonString(std::string& out, std::string_view text) {
+  const std::size_t start = out.size();
+  out += '"';
+  bool checked = false;  // the whole text has been found to be valid UTF-8
+  std::size_t run = 0;   // where the characters not yet written begin
+  for (std::size_t i = 0; i < text.size(); ++i) {
+    const auto c = static_cast<unsigned char>(text[i]);
+    if (c >= 0x80) {
+      if (checked) continue;
+      if (!isValidUtf8(text.substr(i))) {
+        // Rare: the library's own writer decides how each bad byte is replaced.
+        out.resize(start);
+        out += Value(std::string(text)).dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+        return;
+      }
+      checked = true;
+      continue;
+    }
+    if (c >= 0x20 && c != '"' && c != '\\') continue;
+    out.append(text.data() + run, i - run);
+    run = i + 1;
+    switch (c) {
+      case '"': out += "\\\""; break;
+      case '\\': out += "\\\\"; break;
+      case '\b': out += "\\b"; break;
+      case '\f': out += "\\f"; break;
+      case '\n': out += "\\n"; break;
+      case '\r': out += "\\r"; break;
+      case '\t': out += "\\t"; break;
+      default: {
+        static constexpr char kHex[] = "0123456789abcdef";
+        const char escaped[] = {'\\', 'u', '0', '0', kHex[c >> 4], kHex[c & 0xF]};
+        out.append(escaped, sizeof escaped);
+      }
+    }
+  }
+  out.append(text.data() + run, text.size() - run);
+  out += '"';
+}
+
+void appendJsonNumber(std::string& out, double value) {
+  if (!std::isfinite(value)) {
+    out += "null";
+    return;
+  }
+  // The library's own shortest form, so that the text is the one `toJson` writes.
+  char buffer[64];
+  const char* end = nlohmann::detail::to_chars(buffer, buffer + sizeof buffer, value);
+  out.append(buffer, static_cast<std::size_t>(end - buffer));
+}
+
+void appendJsonNumber(std::string& out, std::int64_t value) {
+  char buffer[24];
+  const auto result = std::to_chars(buffer, buffer + sizeof buffer, value);
+  out.append(buffer, static_cast<std::size_t>(result.ptr - buffer));
+}
 
 std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept {
   if (text.size() > limits.maxBytes) return std::nullopt;

@@ -3,6 +3,7 @@
 #include "platform/value/Value.h"
 
 #include <cstddef>
+#include <cstdint>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -22,5 +23,19 @@ struct JsonLimits {
 
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
+
+/// Empties `value` from its leaves up, for a value about to go: the library's own teardown moves
+/// every member of each nested value through a stack it allocates, which costs more than the
+/// building did. Recursion is as deep as the value (parsed values are bounded by JsonLimits).
+void releaseValue(Value& value) noexcept;
+
+// Pieces of JSON text for writers that do without a Value: each appends exactly what `toJson`
+// writes for the same string or number.
+
+/// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
+void appendJsonString(std::string& out, std::string_view text);
+/// A number; "null" for NaN and infinity.
+void appendJsonNumber(std::string& out, double value);
+void appendJsonNumber(std::string& out, std::int64_t value);
 
 }  // namespace kyn::platform
