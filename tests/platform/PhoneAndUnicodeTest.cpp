@@ -74,12 +74,6 @@ TEST(Unicode, KeepingCodePointsDropsIllFormedBytes) {
   EXPECT_EQ(keepCodePoints("1\xFF\xC3" "2", keep), "12");
 }
 
-}  // namespace
-}  // namespace kyn::platform
-
-namespace kyn::platform {
-namespace {
-
 TEST(PhoneNumbers, ACanonicalTextReadsBackAsItself) {
   // Invalid numbers on which the parser's first E.164 text is not stable.
   for (const char* text : {"+44 0 20 7946 0018", "+39 06 698 0000", "+49000 00 7y 44phrase6 "}) {

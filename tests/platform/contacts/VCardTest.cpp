@@ -4,8 +4,6 @@
 
 #include <gtest/gtest.h>
 
-#include <random>
-
 namespace kyn::platform {
 namespace {
 
@@ -390,23 +388,19 @@ TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
   EXPECT_FALSE(parseOne(test::vcard("PHOTO;ENCODING=b:\r\nPHOTO:data:image/png;base64,\r\nPHOTO:data:nocomma\r\n")).imageData);
 }
 
-TEST(VCardPictures, ATenMegabytePhotoIsRead) {
-  // Folded lines of every base64 letter in order: the 6-bit values 0 to 63, packed into 48 bytes.
-  const std::string line = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
-  std::vector<std::uint8_t> block;
+TEST(VCardPictures, ATenMegabytePhotoOfEveryBase64LetterIsRead) {
+  // The letters in order are the 6-bit values 0 to 63, packed four to three bytes; folded lines.
+  std::vector<std::uint8_t> block, big;
   for (std::uint32_t v = 0; v < 64; v += 4) {
     const std::uint32_t n = (v << 18) | ((v + 1) << 12) | ((v + 2) << 6) | (v + 3);
     block.insert(block.end(), {std::uint8_t(n >> 16), std::uint8_t(n >> 8), std::uint8_t(n)});
   }
   std::string folded;
-  std::vector<std::uint8_t> big;
   for (std::size_t i = 0; i < (10u << 20) / 48; ++i) {
-    folded += line + "\r\n ";
+    folded += "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/\r\n ";
     big.insert(big.end(), block.begin(), block.end());
   }
-  const Contact c = parseOne(test::vcard("FN:Big Picture\r\nPHOTO;ENCODING=b:" + folded + "\r\nEMAIL:big@example.com\r\n"));
-  EXPECT_EQ(bytesOf(c.imageData), big);
-  EXPECT_EQ(c.emailAddresses.size(), 1u);
+  EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO;ENCODING=b:" + folded + "\r\n")).imageData), big);
 }
 
 // --- Size and bad input ------------------------------------------------------------------------
@@ -422,26 +416,6 @@ TEST(VCardBadInput, ACardOverTheSizeLimitIsSkippedAndTheNextOneRead) {
   EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB",
                                                       "huge.vcf: the card that begins on line 5 is larger than 32 MiB",
                                                       "huge.vcf: the card that begins on line 11 is larger than 32 MiB"}));
-}
-
-TEST(VCardBadInput, RandomBytesNeverBreakTheReader) {
-  std::mt19937 random(42);
-  const std::string header = "BEGIN:VCARD\r\nFN:";
-  for (int round = 0; round < 200; ++round) {
-    std::string text = round % 2 ? header : std::string();
-    const std::size_t length = random() % 2000;
-    for (std::size_t i = 0; i < length; ++i) {
-      // Bias towards the characters that drive the reader.
-      static constexpr char kSpecial[] = ":;=\\,\"\r\n \t.";
-      text += random() % 3 ? static_cast<char>(random()) : kSpecial[random() % (sizeof kSpecial - 1)];
-    }
-    if (round % 3 == 0) text += "\r\nEND:VCARD\r\n";
-    const auto result = parseVCards(text, "junk.vcf");
-    for (const Contact& c : result.contacts) {
-      EXPECT_FALSE(c.identifier.empty());
-      EXPECT_TRUE(allTextIsUtf8(c));
-    }
-  }
 }
 
 }  // namespace
