@@ -99,13 +99,6 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   EXPECT_EQ(requests[0]["apiVersion"], "4.0");
 }
 
-TEST_F(SearchEndToEnd, AWrongTokenIsNotLoggedIn) {
-  start();
-  std::ofstream(configDir.path() / "token", std::ios::trunc) << "not-the-token\n";
-  EXPECT_EQ(search({"ada@example.com"})["errorCode"], 1001);
-  EXPECT_EQ(sim->requests().at(0)["authorised"], false);
-}
-
 // Whatever went wrong on the way, the assistant hears "service not available"; the limits of
 // config.json reach the transport.
 TEST_F(SearchEndToEnd, EveryFailedExchangeIsServiceNotAvailable) {

@@ -83,8 +83,8 @@ TEST(Json, ValueReaders) {
   EXPECT_EQ(member(array, "s"), nullptr);
 }
 
-// The JSONTestSuite corpus: y_ must parse, n_ must be rejected, i_ may go either way but must not
-// crash or hang.
+// The JSONTestSuite corpus: y_ must parse, n_ must be rejected (the fuzz replay of the same corpus
+// checks that nothing crashes and every document survives a round trip).
 TEST(Json, OutsideCorpus) {
   auto dir = test::sharedTestData("json-parsing");
   if (!dir) GTEST_SKIP() << "../shared/testdata/json-parsing is not beside the project";
@@ -102,9 +102,6 @@ TEST(Json, OutsideCorpus) {
     }
     if (name.starts_with("n_")) {
       EXPECT_FALSE(parsed) << name;
-    }
-    if (parsed) {
-      EXPECT_TRUE(parseJson(toJson(*parsed))) << name << " does not survive a round trip";
     }
   }
   EXPECT_GE(files, 300);
