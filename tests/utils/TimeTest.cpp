@@ -10,18 +10,6 @@ namespace {
 
 using platform::services;
 
-TEST(TimeConversion, MillisecondsAndReferenceSeconds) {
-  EXPECT_EQ(KYNAXUtils::timeIntervalForMillisecondsSince1970(978'307'200'000.0), 0.0);
-  EXPECT_EQ(KYNAXUtils::millisecondsSince1970ForTimeInterval(0.0), 978'307'200'000.0);
-  EXPECT_EQ(KYNAXUtils::timeIntervalForMillisecondsSince1970(1'500.0), -978'307'198.5);
-  EXPECT_FALSE(KYNAXUtils::timeIntervalForMillisecondsSince1970(std::nullopt));
-  EXPECT_FALSE(KYNAXUtils::millisecondsSince1970ForTimeInterval(std::nullopt));
-  // Full precision both ways, and non-finite values pass through the arithmetic.
-  const double ms = 1'763'740'800'123.0;
-  EXPECT_EQ(KYNAXUtils::millisecondsSince1970ForTimeInterval(KYNAXUtils::timeIntervalForMillisecondsSince1970(ms)), ms);
-  EXPECT_TRUE(std::isinf(*KYNAXUtils::timeIntervalForMillisecondsSince1970(INFINITY)));
-}
-
 class MidnightTest : public test::PlatformTest {};
 
 TEST_F(MidnightTest, TodayAndYesterdayAtMidnightInTheUsersTimeZone) {
@@ -103,16 +91,6 @@ TEST_F(AgeStringsTest, TextsFollowTheAssistantsLanguageAndNumbersTheUsersLocale)
   EXPECT_EQ(ageOf(60).spoken, "Localisé il y a 1 minute");
   services().numberFormatting.set(std::make_shared<platform::IcuNumberFormatting>("ar_EG"));
   EXPECT_EQ(ageOf(300).display, "Il y a \u0665 min");
-}
-
-TEST(Int32Truncation, MatchesTheProcessorsConversion) {
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(59.9), 59);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-59.9), -59);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(2147483647.9), 2147483647);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-2147483648.9), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(2147483648.0), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-2147483649.0), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(std::nan("")), INT32_MIN);
 }
 
 }  // namespace
