@@ -381,6 +381,8 @@ TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
   // A thumbnail alone leaves the full picture empty; empty or undecodable data gives no picture.
   EXPECT_FALSE(parseOne(test::vcard(std::string("PHOTO;TYPE=thumbnail;ENCODING=b:") + kOtherBase64 + "\r\n")).imageData);
   EXPECT_FALSE(parseOne(test::vcard("PHOTO;ENCODING=b:\r\nPHOTO:data:image/png;base64,\r\nPHOTO:data:nocomma\r\n")).imageData);
+  // A data URI without a media type or base64 holds its bytes percent-encoded.
+  EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO:data:,%01%02%03\r\n", "4.0")).imageData), kOther);
 }
 
 TEST(VCardPictures, ATenMegabytePhotoOfEveryBase64LetterIsRead) {
