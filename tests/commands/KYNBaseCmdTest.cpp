@@ -57,18 +57,6 @@ TEST_F(KYNBaseCmdTest, EveryParseSetsTheStatusCodeAsItCame) {
   }
 }
 
-TEST_F(KYNBaseCmdTest, MinimumCallbackIntervalIsInSeconds) {
-  KYNBaseCmd command;
-  EXPECT_EQ(command.minCallbackInterval(), 0.0);
-  command.setResponseBody(R"({"serverContext":{"minCallbackIntervalInMS":5000}})");
-  EXPECT_EQ(command.minCallbackInterval(), 5.0);
-  for (const char* body : {R"({"serverContext":{}})", R"({"serverContext":{"minCallbackIntervalInMS":"5000"}})",
-                           R"({"serverContext":"x"})"}) {
-    command.setResponseBody(body);
-    EXPECT_EQ(command.minCallbackInterval(), 0.0) << body;
-  }
-}
-
 TEST_F(KYNBaseCmdTest, TheDescriptionNeverShowsTheToken) {
   KYNBaseCmd command;
   command.setTransferResult(false, platform::HTTPResponse{401});

@@ -189,11 +189,5 @@ TEST_F(KYNAXDataSourceTest, WithoutAControllerEveryCommandIsStillAnswered) {
   for (const auto& reply : replies) EXPECT_EQ(reply["errorCode"], AXKynServiceNotAvailableErrorCode);
 }
 
-TEST_F(KYNAXDataSourceTest, MockDataIsReadByNoOne) {
-  KYNAXDataSource source;
-  source.loadMockLocationData();  // no resource ships
-  EXPECT_FALSE(source.mockLocations());
-}
-
 }  // namespace
 }  // namespace kyn

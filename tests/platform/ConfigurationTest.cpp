@@ -25,12 +25,7 @@ TEST_F(ConfigurationTest, WithoutAFileEverythingHasItsDefault) {
   EXPECT_EQ(c.preferencesDirectory(), configDir->path() / "preferences");
   EXPECT_EQ(c.contactsPath(), configDir->path() / "contacts");
   EXPECT_FALSE(c.language());
-  const TransportSettings defaults;
   EXPECT_FALSE(c.transport().caFile);
-  EXPECT_EQ(c.transport().connectTimeout, defaults.connectTimeout);
-  EXPECT_EQ(c.transport().totalTimeout, defaults.totalTimeout);
-  EXPECT_EQ(c.transport().maxResponseBytes, defaults.maxResponseBytes);
-  EXPECT_EQ(c.transport().maxRedirects, defaults.maxRedirects);
   EXPECT_EQ(errors(), 0u);
 }
 

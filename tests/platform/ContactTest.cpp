@@ -34,12 +34,10 @@ TEST(ContactProjection, KeepsOnlyWhatTheKeysName) {
   EXPECT_FALSE(p.imageData);
   EXPECT_TRUE(p.phoneNumbers.empty());
   EXPECT_EQ(unknown, "noSuchKey");
-}
-
-TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePart) {
-  const Contact p = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
-  EXPECT_EQ(fullNameOfContact(p, "en_US"), fullNameOfContact(sample(), "en_US"));
-  EXPECT_FALSE(p.note);
+  // The full-name descriptor brings every name part.
+  const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
+  EXPECT_EQ(fullNameOfContact(named, "en_US"), fullNameOfContact(sample(), "en_US"));
+  EXPECT_FALSE(named.note);
 }
 
 TEST(ContactFullName, TheCardsOwnNameWins) {

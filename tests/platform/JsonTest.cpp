@@ -40,6 +40,8 @@ TEST(Json, RejectsWhatIsNotOneValidDocument) {
   EXPECT_FALSE(parseJson(std::string("\"\xC3\x28\"")));  // invalid UTF-8
   EXPECT_FALSE(parseJson(std::string("\"\xED\xA0\x80\"")));  // an encoded surrogate
   EXPECT_FALSE(parseJson(std::string_view()));             // no text, not even a pointer to one
+  EXPECT_FALSE(parseJson(std::string("[1]\0garbage", 11)));  // a NUL byte ends nothing
+  EXPECT_FALSE(parseJson(std::string("\"a\0b\"", 5)));
 }
 
 TEST(Json, BoundsDepthAndSize) {
@@ -81,8 +83,8 @@ TEST(Json, ValueReaders) {
   EXPECT_EQ(member(array, "s"), nullptr);
 }
 
-// The JSONTestSuite corpus: y_ must parse, n_ must be rejected, i_ may go either way but must not
-// crash or hang.
+// The JSONTestSuite corpus: y_ must parse, n_ must be rejected (the fuzz replay of the same corpus
+// checks that nothing crashes and every document survives a round trip).
 TEST(Json, OutsideCorpus) {
   auto dir = test::sharedTestData("json-parsing");
   if (!dir) GTEST_SKIP() << "../shared/testdata/json-parsing is not beside the project";
@@ -101,22 +103,8 @@ TEST(Json, OutsideCorpus) {
     if (name.starts_with("n_")) {
       EXPECT_FALSE(parsed) << name;
     }
-    if (parsed) {
-      EXPECT_TRUE(parseJson(toJson(*parsed))) << name << " does not survive a round trip";
-    }
   }
   EXPECT_GE(files, 300);
-}
-
-}  // namespace
-}  // namespace kyn::platform
-
-namespace kyn::platform {
-namespace {
-
-TEST(Json, ANulByteEndsNothing) {
-  EXPECT_FALSE(parseJson(std::string("[1]\0garbage", 11)));
-  EXPECT_FALSE(parseJson(std::string("\"a\0b\"", 5)));
 }
 
 }  // namespace

@@ -5,11 +5,6 @@
 namespace kyn::platform {
 namespace {
 
-TEST(Log, SharedLogHasTheSubsystemAndCategory) {
-  EXPECT_EQ(Log::shared().subsystem(), "com.zanto.tessel.kyn.assistant");
-  EXPECT_EQ(Log::shared().category(), "_");
-}
-
 TEST(Log, LinesBelowTheMinimumLevelAreDropped) {
   Log log("s", "c");
   auto sink = std::make_shared<CaptureLogSink>();

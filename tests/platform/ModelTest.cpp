@@ -42,13 +42,6 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
     "searchContext":"kynServerContext://serverContext?"})"));
 }
 
-TEST(Model, AbsentDiffersFromEmpty) {
-  AXKynSearch search;
-  EXPECT_FALSE(search.dictionary().contains("friends"));
-  search.friends.emplace();
-  EXPECT_EQ(search.dictionary()["friends"], Value::array());
-}
-
 TEST(Model, CommandsReadBackFromTheirDictionary) {
   const auto text = R"({"class":"AXKynGeoFenceSet",
     "friend":{"class":"AXPerson","phones":[{"class":"AXPhone","number":"+1 408 555 0100"}]},

@@ -45,13 +45,6 @@ TEST(Unicode, DecimalDigitsOfEveryScript) {
   for (char32_t c : {U'a', U'+', U'\u00B2', U'\u2164', U'\u4E09'}) EXPECT_FALSE(isDecimalDigit(c)) << static_cast<std::uint32_t>(c);  // ², Ⅴ, 三
 }
 
-TEST(Unicode, CaseFoldingForComparisons) {
-  EXPECT_EQ(foldCase("Ada@Example.COM"), foldCase("ada@example.com"));
-  EXPECT_EQ(foldCase("STRASSE"), foldCase("Straße"));
-  EXPECT_EQ(foldCase("ÉLODIE"), "élodie");
-  EXPECT_EQ(foldCase("a\xFF" "b"), "a\uFFFDb");
-}
-
 TEST(Unicode, CuttingKeepsWholeCharacters) {
   auto digit = [](char32_t c) { return isDecimalDigit(c); };
   EXPECT_EQ(suffixFromFirstMatch("Tel: 555", digit), "555");
@@ -73,12 +66,6 @@ TEST(Unicode, KeepingCodePointsDropsIllFormedBytes) {
   EXPECT_EQ(keepCodePoints("\u0664\u0660 x", keep), "\u0664\u0660");
   EXPECT_EQ(keepCodePoints("1\xFF\xC3" "2", keep), "12");
 }
-
-}  // namespace
-}  // namespace kyn::platform
-
-namespace kyn::platform {
-namespace {
 
 TEST(PhoneNumbers, ACanonicalTextReadsBackAsItself) {
   // Invalid numbers on which the parser's first E.164 text is not stable.

@@ -55,10 +55,8 @@ TEST_F(SystemInfoTest, AccountFilesThatNameNoOne) {
   EXPECT_FALSE(account->personId() || account->username() || account->hostNameOfType(0));
   EXPECT_FALSE(fileSession.isProvisionedForLocationSharing());
   EXPECT_EQ(log->messages(LogLevel::Error).size(), 5u + 3u);  // each bad file, each field of the wrong type
-}
 
-TEST_F(SystemInfoTest, SessionFlagsDefaultToProvisionedAndUnrestricted) {
-  AccountFileSession fileSession(configDir->path() / "account.json");
+  // The session flags default to provisioned and unrestricted.
   configDir->write("account.json", R"({"personId":"P7"})");
   EXPECT_TRUE(fileSession.isProvisionedForLocationSharing());
   EXPECT_FALSE(fileSession.isRestricted());

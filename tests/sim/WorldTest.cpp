@@ -1,4 +1,3 @@
-#include "sim/GetLocations.h"
 #include "sim/Settings.h"
 #include "sim/World.h"
 
@@ -9,16 +8,13 @@ namespace {
 
 constexpr std::int64_t kNow = 1'763'740'800'000;
 
-// Sam (account 0) with Ada, Bram (pending) and Bo as friends, and a place "Work" 11 km north of
-// home; Ada (account 1) with Sam as a friend; Cy (account 2) without friends.
+// Sam (account 0) with Ada as a friend and a place "Work" 11 km north of home; Ada (account 1) with
+// Sam as a friend.
 const char* const kData = R"({
   "me": {"handle": "sam@example.com", "location": {"latitude": 45.0, "longitude": -122.0}, "ageSeconds": 10,
          "places": {"Work": {"latitude": 45.1, "longitude": -122.0}}},
-  "friends": {"ada@example.com": {"location": {"latitude": 45.0, "longitude": -122.0}, "ageSeconds": 60},
-              "+15035550102": {"pending": true}, "bo@example.com": {}},
-  "accounts": {"1000000002": {"me": {"handle": "ada@example.com"}, "friends": {"sam@example.com": {}}},
-               "1000000003": {"me": {"handle": "cy@example.com"}}},
-  "gazetteer": [{"streetAddress": "1 Example Way", "locality": "Portland", "latitude": 45.2, "longitude": -122.0}]
+  "friends": {"ada@example.com": {"location": {"latitude": 45.0, "longitude": -122.0}, "ageSeconds": 60}},
+  "accounts": {"1000000002": {"me": {"handle": "ada@example.com"}, "friends": {"sam@example.com": {}}}}
 })";
 
 constexpr Coordinate kHome{45.0, -122.0};
@@ -60,70 +56,10 @@ class WorldTest : public ::testing::Test {
     notes.clear();
     return out;
   }
-  Json seenBy(std::size_t account, const std::string& handle) {
-    return answerGetLocations(world.view(account), {{"clientContext", Json::object()}, {"handles", {handle}}},
-                              kNow)["locations"][handle]["location"];
-  }
 
   std::vector<Json> notes;
   World world{data(), [this](const Json& n) { notes.push_back(n); }};
 };
-
-TEST_F(WorldTest, EachGeofenceOutcomeHasItsCode) {
-  struct Case {
-    const char* what;
-    Json patch;
-    int status;
-    std::size_t account = 0;
-  };
-  const Case cases[] = {
-      {"a coordinate", {{"requestedLocation", at({45.2, -122.0})}, {"label", "Gym"}}, 200},
-      {"a place of the account", {{"label", "work"}}, 200},
-      {"an address of the gazetteer", {{"fullAddress", {{"streetAddress", "1  example WAY"}}}}, 200},
-      {"nothing: where the friend is now", {{"trigger", "exit"}}, 200},
-      {"switched off", {{"isOn", "false"}, {"label", "Work"}}, 221},
-      {"nobody's friend", {{"emails", {"eve@example.com"}}}, 411},
-      {"no handle at all", {{"emails", Json::array()}}, 411},
-      {"an account without friends", {{"emails", {"sam@example.com"}}}, 417, 2},
-      {"an unknown label", {{"label", "Gym"}, {"address", "Gym"}}, 521},
-      {"an unknown address", {{"address", "9 Nowhere Road\nPortland OR"}}, 535},
-      {"a pending friend who cannot be placed", {{"emails", {"+15035550102"}}}, 535},
-      {"a place too vague", {{"requestedLocation", at(kWork, 20'000)}}, 543},
-      {"an immediate fence that repeats", {{"label", "Work"}, {"trigger", "immediate"}}, 544},
-  };
-  for (const Case& c : cases) {
-    World fresh(data());
-    Json request = {{"clientContext", Json::object()}, {"emails", {"ada@example.com"}}, {"isOn", "true"},
-                    {"trigger", "enter"}, {"onetimeonly", "false"}, {"type", "NotifyMe"}};
-    request.update(c.patch);
-    const Json answer = answerGeoFence(fresh, c.account, request, kNow);
-    EXPECT_EQ(answer["statusCode"], c.status) << c.what;
-    EXPECT_EQ(answer.contains("fence"), c.status == 200) << c.what;
-    EXPECT_EQ(answer.contains("fullAddress"), c.status == 200) << c.what;
-    EXPECT_TRUE(answer.contains("serverContext")) << c.what;
-  }
-
-  const Json placed = setFence({{"fullAddress", {{"streetAddress", "1 Example Way"}, {"locality", "Portland"}}}});
-  EXPECT_EQ(placed["fence"]["emails"], Json({"ada@example.com"}));
-  EXPECT_EQ(placed["fence"]["latitude"], 45.2);
-  EXPECT_EQ(placed["fence"]["longitude"], -122.0);
-  EXPECT_EQ(placed["fullAddress"]["streetAddress"], "1 Example Way");
-
-  for (const Json& bad : {Json{{"isOn", true}}, Json{{"trigger", "arrive"}}, Json{{"trigger", ""}},
-                          Json{{"type", "NotifyAll"}}, Json{{"emails", "ada@example.com"}}, Json{{"label", nullptr}}}) {
-    EXPECT_THROW(setFence(bad), BadRequest) << bad;
-  }
-}
-
-TEST_F(WorldTest, OnlyFencesThatAreOnCountTowardsTheLimitPerFriend) {
-  for (int i = 0; i < 3; ++i) {
-    EXPECT_EQ(setFence({{"requestedLocation", at({46.0 + i, -122.0})}})["statusCode"], 200);
-  }
-  EXPECT_EQ(setFence({{"requestedLocation", at({46.0, -122.0})}})["statusCode"], 200);  // the same fence, changed
-  EXPECT_EQ(setFence({{"label", "Work"}})["statusCode"], 542);
-  EXPECT_EQ(setFence({{"requestedLocation", at({46.0, -122.0})}, {"isOn", "false"}})["statusCode"], 221);
-  EXPECT_EQ(setFence({{"label", "Work"}})["statusCode"], 200);
-}
 
 TEST_F(WorldTest, FencesFireAsPeopleCrossThem) {
   // Ada is at home, inside the first two fences and outside the rest.

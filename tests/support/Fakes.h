@@ -66,7 +66,6 @@ class FixedClock final : public platform::Clock {
   explicit FixedClock(platform::Date now = 0.0) : now_(now) {}
   platform::Date now() const override { return now_.load(); }
   void set(platform::Date now) { now_.store(now); }
-  void advance(double seconds) { now_.store(now_.load() + seconds); }
 
  private:
   std::atomic<platform::Date> now_;

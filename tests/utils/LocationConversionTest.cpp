@@ -29,6 +29,11 @@ TEST_F(LocationConversionTest, ZeroOrMissingCoordinatesAreNoLocation) {
   EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, 0.0)));
   EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(std::nullopt, 20.0)));
   EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, std::nullopt)));
+  // There is no range check until the dictionary.
+  const auto unchecked = KYNAXUtils::coreLocationForAXLocation(ax(std::nan(""), 20.0));
+  ASSERT_TRUE(unchecked);
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(unchecked));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(KYNAXUtils::coreLocationForAXLocation(ax(91.0, 20.0))));
 }
 
 TEST_F(LocationConversionTest, AnAssistantLocationBecomesAFixStampedNow) {
@@ -41,13 +46,6 @@ TEST_F(LocationConversionTest, AnAssistantLocationBecomesAFixStampedNow) {
   EXPECT_EQ(l->speed, 0.0);
   EXPECT_EQ(l->timestamp, clock->now());
   EXPECT_EQ(KYNAXUtils::coreLocationForAXLocation(ax(10.0, 20.0, 65.0))->horizontalAccuracy, 65.0);
-}
-
-TEST_F(LocationConversionTest, ThereIsNoRangeCheckUntilTheDictionary) {
-  auto l = KYNAXUtils::coreLocationForAXLocation(ax(std::nan(""), 20.0));
-  ASSERT_TRUE(l);
-  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(l));
-  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(KYNAXUtils::coreLocationForAXLocation(ax(91.0, 20.0))));
 }
 
 TEST_F(LocationConversionTest, TheDictionaryHoldsCoordinateAndSourceInOrder) {

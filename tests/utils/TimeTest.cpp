@@ -10,18 +10,6 @@ namespace {
 
 using platform::services;
 
-TEST(TimeConversion, MillisecondsAndReferenceSeconds) {
-  EXPECT_EQ(KYNAXUtils::timeIntervalForMillisecondsSince1970(978'307'200'000.0), 0.0);
-  EXPECT_EQ(KYNAXUtils::millisecondsSince1970ForTimeInterval(0.0), 978'307'200'000.0);
-  EXPECT_EQ(KYNAXUtils::timeIntervalForMillisecondsSince1970(1'500.0), -978'307'198.5);
-  EXPECT_FALSE(KYNAXUtils::timeIntervalForMillisecondsSince1970(std::nullopt));
-  EXPECT_FALSE(KYNAXUtils::millisecondsSince1970ForTimeInterval(std::nullopt));
-  // Full precision both ways, and non-finite values pass through the arithmetic.
-  const double ms = 1'763'740'800'123.0;
-  EXPECT_EQ(KYNAXUtils::millisecondsSince1970ForTimeInterval(KYNAXUtils::timeIntervalForMillisecondsSince1970(ms)), ms);
-  EXPECT_TRUE(std::isinf(*KYNAXUtils::timeIntervalForMillisecondsSince1970(INFINITY)));
-}
-
 class MidnightTest : public test::PlatformTest {};
 
 TEST_F(MidnightTest, TodayAndYesterdayAtMidnightInTheUsersTimeZone) {
@@ -76,19 +64,13 @@ TEST_F(AgeStringsTest, EveryBandAtItsBoundaries) {
       {10'799, "2 hr ago", "Located 2 hours ago"},
       {10'800, "3 hr ago", "Located 3 hours ago"},
       {86'400.0 * 3, "72 hr ago", "Located 72 hours ago"},
+      {-90, "1 min ago", "Located 1 minute ago"},  // the future counts like the past
   };
   for (const auto& c : cases) {
     const Band band = ageOf(c.secondsAgo);
     EXPECT_EQ(band.display, c.display) << c.secondsAgo;
     EXPECT_EQ(band.spoken, c.spoken) << c.secondsAgo;
   }
-}
-
-TEST_F(AgeStringsTest, TheFutureCountsLikeThePast) {
-  const Band past = ageOf(90);
-  const Band future = ageOf(-90);
-  EXPECT_EQ(past.display, future.display);
-  EXPECT_EQ(future.display, "1 min ago");
 }
 
 TEST_F(AgeStringsTest, NoDateAndUnrepresentableAgesReadAsNow) {
@@ -109,16 +91,6 @@ TEST_F(AgeStringsTest, TextsFollowTheAssistantsLanguageAndNumbersTheUsersLocale)
   EXPECT_EQ(ageOf(60).spoken, "Localisé il y a 1 minute");
   services().numberFormatting.set(std::make_shared<platform::IcuNumberFormatting>("ar_EG"));
   EXPECT_EQ(ageOf(300).display, "Il y a \u0665 min");
-}
-
-TEST(Int32Truncation, MatchesTheProcessorsConversion) {
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(59.9), 59);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-59.9), -59);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(2147483647.9), 2147483647);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-2147483648.9), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(2147483648.0), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(-2147483649.0), INT32_MIN);
-  EXPECT_EQ(KYNAXUtils::truncateToInt32(std::nan("")), INT32_MIN);
 }
 
 }  // namespace

@@ -4,8 +4,6 @@
 
 #include <gtest/gtest.h>
 
-#include <random>
-
 namespace kyn::platform {
 namespace {
 
@@ -46,8 +44,7 @@ TEST(VCardLines, AnyLineEndingAndFoldsWithSpaceOrTabJoinTheirLine) {
                              "EMAIL:ada@exam\r\n ple.com\nEND:VCARD");
   EXPECT_EQ(c.formattedName, "Ada Lovelace");  // the break and one blank go, the second blank stays
   EXPECT_EQ(c.note, "onetwothree");
-  ASSERT_EQ(c.emailAddresses.size(), 1u);
-  EXPECT_EQ(c.emailAddresses[0].value, "ada@example.com");
+  EXPECT_EQ(c.emailAddresses, (Labeled{{std::nullopt, "ada@example.com"}}));
 }
 
 TEST(VCardLines, FoldsInOddPlaces) {
@@ -142,10 +139,8 @@ TEST(VCardLines, CutOffCardsAreReportedAndTheCardsAroundThemRead) {
   EXPECT_EQ(result.contacts[0].formattedName, "First");
   EXPECT_EQ(result.contacts[1].formattedName, "Third");
   EXPECT_EQ(result.contacts[1].identifier, "cut.vcf#2");  // positions count the skipped card too
-  ASSERT_EQ(result.skipped.size(), 2u);
-  EXPECT_EQ(result.skipped[0], "cut.vcf: the card that begins on line 4 has no END:VCARD");
-  EXPECT_EQ(result.skipped[1], "cut.vcf: the card that begins on line 10 has no END:VCARD");
-  EXPECT_EQ(result.skipped[1].find("Last"), std::string::npos);  // reports never carry card contents
+  EXPECT_EQ(result.skipped, (std::vector<std::string>{"cut.vcf: the card that begins on line 4 has no END:VCARD",
+                                                      "cut.vcf: the card that begins on line 10 has no END:VCARD"}));
 }
 
 TEST(VCardLines, AnEmbeddedAgentCardIsSkippedUpToItsEnd) {
@@ -163,14 +158,12 @@ TEST(VCardLines, CardsWithoutUidAreNamedByTheirSourceAndPosition) {
   const auto result = parseVCards(test::vcard("FN:A\r\n") + test::vcard("UID:urn:uuid:5F1C\\,x \r\nFN:B\r\n") + test::vcard("FN:A\r\n") +
                                       test::vcard("UID:same\r\nFN:C\r\n") + test::vcard("UID:same\r\nFN:D\r\n") + test::vcard("UID:\r\n"),
                                   "friends/list.vcf");
-  ASSERT_EQ(result.contacts.size(), 6u);
-  EXPECT_EQ(result.contacts[0].identifier, "friends/list.vcf#0");
-  EXPECT_EQ(result.contacts[1].identifier, "urn:uuid:5F1C\\,x");  // as written, blanks around it trimmed
-  EXPECT_EQ(result.contacts[2].identifier, "friends/list.vcf#2");
-  // Same identifiers stay separate cards here; the store unifies them.
-  EXPECT_EQ(result.contacts[3].identifier, "same");
-  EXPECT_EQ(result.contacts[4].identifier, "same");
-  EXPECT_EQ(result.contacts[5].identifier, "friends/list.vcf#5");
+  std::vector<std::string> ids;
+  for (const Contact& c : result.contacts) ids.push_back(c.identifier);
+  // A UID as written, blanks around it trimmed; same identifiers stay separate cards here (the store
+  // unifies them).
+  EXPECT_EQ(ids, (std::vector<std::string>{"friends/list.vcf#0", "urn:uuid:5F1C\\,x", "friends/list.vcf#2", "same",
+                                           "same", "friends/list.vcf#5"}));
 }
 
 // --- Properties, parameters, escapes -----------------------------------------------------------
@@ -388,25 +381,23 @@ TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
   // A thumbnail alone leaves the full picture empty; empty or undecodable data gives no picture.
   EXPECT_FALSE(parseOne(test::vcard(std::string("PHOTO;TYPE=thumbnail;ENCODING=b:") + kOtherBase64 + "\r\n")).imageData);
   EXPECT_FALSE(parseOne(test::vcard("PHOTO;ENCODING=b:\r\nPHOTO:data:image/png;base64,\r\nPHOTO:data:nocomma\r\n")).imageData);
+  // A data URI without a media type or base64 holds its bytes percent-encoded.
+  EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO:data:,%01%02%03\r\n", "4.0")).imageData), kOther);
 }
 
-TEST(VCardPictures, ATenMegabytePhotoIsRead) {
-  // Folded lines of every base64 letter in order: the 6-bit values 0 to 63, packed into 48 bytes.
-  const std::string line = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/";
-  std::vector<std::uint8_t> block;
+TEST(VCardPictures, ATenMegabytePhotoOfEveryBase64LetterIsRead) {
+  // The letters in order are the 6-bit values 0 to 63, packed four to three bytes; folded lines.
+  std::vector<std::uint8_t> block, big;
   for (std::uint32_t v = 0; v < 64; v += 4) {
     const std::uint32_t n = (v << 18) | ((v + 1) << 12) | ((v + 2) << 6) | (v + 3);
     block.insert(block.end(), {std::uint8_t(n >> 16), std::uint8_t(n >> 8), std::uint8_t(n)});
   }
   std::string folded;
-  std::vector<std::uint8_t> big;
   for (std::size_t i = 0; i < (10u << 20) / 48; ++i) {
-    folded += line + "\r\n ";
+    folded += "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789+/\r\n ";
     big.insert(big.end(), block.begin(), block.end());
   }
-  const Contact c = parseOne(test::vcard("FN:Big Picture\r\nPHOTO;ENCODING=b:" + folded + "\r\nEMAIL:big@example.com\r\n"));
-  EXPECT_EQ(bytesOf(c.imageData), big);
-  EXPECT_EQ(c.emailAddresses.size(), 1u);
+  EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO;ENCODING=b:" + folded + "\r\n")).imageData), big);
 }
 
 // --- Size and bad input ------------------------------------------------------------------------
@@ -422,26 +413,6 @@ TEST(VCardBadInput, ACardOverTheSizeLimitIsSkippedAndTheNextOneRead) {
   EXPECT_EQ(result.skipped, (std::vector<std::string>{"huge.vcf: the card that begins on line 1 is larger than 32 MiB",
                                                       "huge.vcf: the card that begins on line 5 is larger than 32 MiB",
                                                       "huge.vcf: the card that begins on line 11 is larger than 32 MiB"}));
-}
-
-TEST(VCardBadInput, RandomBytesNeverBreakTheReader) {
-  std::mt19937 random(42);
-  const std::string header = "BEGIN:VCARD\r\nFN:";
-  for (int round = 0; round < 200; ++round) {
-    std::string text = round % 2 ? header : std::string();
-    const std::size_t length = random() % 2000;
-    for (std::size_t i = 0; i < length; ++i) {
-      // Bias towards the characters that drive the reader.
-      static constexpr char kSpecial[] = ":;=\\,\"\r\n \t.";
-      text += random() % 3 ? static_cast<char>(random()) : kSpecial[random() % (sizeof kSpecial - 1)];
-    }
-    if (round % 3 == 0) text += "\r\nEND:VCARD\r\n";
-    const auto result = parseVCards(text, "junk.vcf");
-    for (const Contact& c : result.contacts) {
-      EXPECT_FALSE(c.identifier.empty());
-      EXPECT_TRUE(allTextIsUtf8(c));
-    }
-  }
 }
 
 }  // namespace
