@@ -65,7 +65,7 @@ TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
 }
 
 TEST(Json, ValueReaders) {
-  auto v = *parseJson(R"({"s":"12abc","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"u":18446744073709551615})");
+  auto v = *parseJson(R"({"s":"12abc","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"edge":9.223372036854775808e18,"u":18446744073709551615})");
   EXPECT_EQ(integerValue(member(v, "s")), 12);
   EXPECT_EQ(integerValue(member(v, "n")), 7);
   EXPECT_EQ(integerValue(member(v, "neg")), -3);
@@ -73,6 +73,7 @@ TEST(Json, ValueReaders) {
   EXPECT_EQ(integerValue(member(v, "null")), 0);
   EXPECT_EQ(integerValue(member(v, "missing")), 0);
   EXPECT_EQ(integerValue(member(v, "big")), INT64_MAX);
+  EXPECT_EQ(integerValue(member(v, "edge")), INT64_MAX);  // 2^63 itself does not fit either
   EXPECT_EQ(integerValue(member(v, "u")), INT64_MAX);
   EXPECT_EQ(member(v, "null")->is_null(), true);
   EXPECT_EQ(memberNotNull(&v, "null"), nullptr);

@@ -40,6 +40,15 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
       "latitude":37.33,"longitude":0.0}],
     "atRequestedLocation":false,
     "searchContext":"kynServerContext://serverContext?"})"));
+
+  // The host gets the reply as text written from the record: the same text as the dictionary's,
+  // escapes, broken UTF-8 and number forms included.
+  person->fullName = "\"Ada\"\\ \n\x01\x7F \xC3\xA9 \xFF\xC3 \xF0\x9F\x98\x80";
+  location->latitude = -0.0;
+  location->longitude = 1e21;
+  location->locationDate = 1763740500000.5;
+  reply->atRequestedLocation.reset();
+  EXPECT_EQ(AXReply(reply).json(), platform::toJson(reply->dictionary()));
 }
 
 TEST(Model, CommandsReadBackFromTheirDictionary) {

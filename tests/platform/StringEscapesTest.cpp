@@ -34,7 +34,7 @@ TEST(PercentEscape, DecodeIsTheExactInverse) {
 }
 
 TEST(PercentEscape, BrokenEscapesDecodeToNothing) {
-  for (const char* bad : {"%", "%4", "abc%", "%zz", "%G1", "%C3"}) {
+  for (const char* bad : {"%", "%4", "abc%", "%zz", "%G1", "%C3", "%G3%80%80%80"}) {
     EXPECT_FALSE(decodeFromPercentEscape(bad)) << bad;
   }
   EXPECT_EQ(decodeFromPercentEscape("%41%62c"), "Abc");
