@@ -1,5 +1,7 @@
 #include "platform/value/Json.h"
 
+#include "platform/text/StringEscapes.h"
+
 #include <simdjson.h>
 
 #include <charconv>
@@ -252,45 +254,6 @@ std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) 
   Value value;
   if (!Converter(limits.maxDepth).convert(root, value)) return std::nullopt;
   return value;
-}
-
-/// Whether `text` is well-formed UTF-8 (no overlong forms, surrogates or code points past U+10FFFF).
-bool isValidUtf8(std::string_view text) noexcept {
-  const auto* p = reinterpret_cast<const unsigned char*>(text.data());
-  const auto* end = p + text.size();
-  auto continuation = [&](const unsigned char* at, unsigned char low, unsigned char high) {
-    return at < end && *at >= low && *at <= high;
-  };
-  while (p < end) {
-    const unsigned char c = *p;
-    if (c < 0x80) {
-      ++p;
-      continue;
-    }
-    // The second byte's range depends on the first; every later byte is 80..BF.
-    unsigned char low = 0x80;
-    unsigned char high = 0xBF;
-    int length = 0;
-    if (c >= 0xC2 && c <= 0xDF) {
-      length = 2;
-    } else if (c >= 0xE0 && c <= 0xEF) {
-      length = 3;
-      if (c == 0xE0) low = 0xA0;
-      if (c == 0xED) high = 0x9F;
-    } else if (c >= 0xF0 && c <= 0xF4) {
-      length = 4;
-      if (c == 0xF0) low = 0x90;
-      if (c == 0xF4) high = 0x8F;
-    } else {
-      return false;
-    }
-    if (!continuation(p + 1, low, high)) return false;
-    for (int i = 2; i < length; ++i) {
-      if (!continuation(p + i, 0x80, 0xBF)) return false;
-    }
-    p += length;
-  }
-  return true;
 }
 
 }  // namespace
