@@ -9,7 +9,7 @@ namespace {
 TEST(Format, RendersEachPlaceholderKind) {
   EXPECT_EQ(format("search: %@", std::string("x")), "search: x");
   EXPECT_EQ(format("ERROR: Server HTTP Status: %ld", 401), "ERROR: Server HTTP Status: 401");
-  EXPECT_EQ(format("%d/%li/%i/%u", -1, 2L, 3, 4u), "-1/2/3/4");
+  EXPECT_EQ(format("%d/%li/%i/%u/%hd/%qd/%zu", -1, 2L, 3, 4u, 5, 6, 7u), "-1/2/3/4/5/6/7");
   EXPECT_EQ(format("Unit:%li", std::int64_t{-9'000'000'000}), "Unit:-9000000000");
   EXPECT_EQ(format("100%% sure"), "100% sure");
   EXPECT_EQ(format("%@", 2.5), "2.5");

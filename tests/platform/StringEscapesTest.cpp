@@ -61,6 +61,7 @@ TEST(Numeric, LeadingIntegerSaturates) {
   EXPECT_EQ(leadingInteger32("abc"), 0);
   EXPECT_EQ(leadingInteger64("-9223372036854775808"), INT64_MIN);
   EXPECT_EQ(leadingInteger64("99999999999999999999"), INT64_MAX);
+  EXPECT_EQ(leadingInteger64("9223372036854775806"), INT64_MAX - 1);  // one below the cut
 }
 
 TEST(Numeric, DescriptionsReadBackAsTheSameNumber) {
@@ -80,6 +81,9 @@ TEST(Utf8, Validation) {
   EXPECT_FALSE(isValidUtf8("\xED\xA0\x80"));  // surrogate
   EXPECT_FALSE(isValidUtf8("\xF4\x90\x80\x80"));  // beyond U+10FFFF
   EXPECT_FALSE(isValidUtf8("\xE6\xBC"));      // truncated
+  // The first and last code point of each length are valid; one below each first is overlong.
+  EXPECT_TRUE(isValidUtf8("\xC2\x80 \xDF\xBF \xE0\xA0\x80 \xEF\xBF\xBF \xF0\x90\x80\x80 \xF4\x8F\xBF\xBF"));
+  for (const char* overlong : {"\xC1\xBF", "\xE0\x9F\xBF", "\xF0\x8F\xBF\xBF"}) EXPECT_FALSE(isValidUtf8(overlong));
 }
 
 }  // namespace

@@ -100,7 +100,9 @@ TEST_F(SystemInfoTest, DeviceFacts) {
   EXPECT_FALSE(facts.productType());
   configDir->write("os-release", "VERSION_ID=12\n");
   EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead
-  if (auto udid = facts.deviceUDID()) {  // needs a machine id
+  // An identifier exactly when the machine has an id (a bare chroot may have none).
+  ASSERT_EQ(facts.deviceUDID().has_value(), test::readFile("/etc/machine-id").size() >= 32);
+  if (auto udid = facts.deviceUDID()) {
     EXPECT_EQ(udid->size(), 36u);
     EXPECT_EQ(*udid, facts.deviceUDID());
     std::string compact;
