@@ -238,8 +238,11 @@ std::string toUtf8(std::string bytes, std::string_view charset) {
   if (charset.empty() || equalsIgnoringCase(charset, "UTF-8") || equalsIgnoringCase(charset, "UTF8")) {
     if (isValidUtf8(bytes)) return bytes;
     if (!charset.empty()) return repairUtf8(std::move(bytes));
-  } else if (charset.size() < 64) {
-    if (auto converted = convertWith(std::string(charset).c_str(), bytes)) return *converted;
+  } else {
+    // A name longer than any character set's is not looked up at all.
+    if (charset.size() < 64) {
+      if (auto converted = convertWith(std::string(charset).c_str(), bytes)) return *converted;
+    }
     if (isValidUtf8(bytes)) return bytes;
   }
   if (auto converted = convertWith("windows-1252", bytes)) return *converted;

@@ -333,7 +333,7 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
       "NOTE;CHARSET=Shift_JIS:\x93\xFA\x96\x7B\r\n"                 // "Japan" in Shift_JIS
       "N:\x93Quoted\x94;Ren\xE9\r\n"                                // no charset, no UTF-8: windows-1252
       "ORG;CHARSET=UTF-8:Caf\xC3\xA9 \xFF\xC3 end\r\n"              // declared UTF-8: ill-formed parts marked
-      "TITLE;CHARSET=x-no-such-charset:Se\xC3\xB1or\r\n"            // unknown charset: read as if none
+      "TITLE;CHARSET=x-no-such-charset-with-a-name-much-longer-than-any-character-set-has:Se\xC3\xB1or\r\n"  // as if none
       "X-MAIDENNAME;CHARSET=US-ASCII:Fran\xE7ois\r\n"               // a false US-ASCII: as if none
       "X-SOCIALPROFILE;TYPE=\xE9t\xE9:https://example.com/p\r\n"      // a parameter is no UTF-8 either
       "NICKNAME;CHARSET=../../../etc/passwd:Pe\xF1" "a\r\n"         // never a file name for ICU
