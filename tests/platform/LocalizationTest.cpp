@@ -1,8 +1,10 @@
+#include "platform/assistant/AssistantPreferences.h"
 #include "platform/localization/Localization.h"
 #include "platform/log/Format.h"
 #include "platform/localization/IcuLocalization.h"
 
 #include <gtest/gtest.h>
+#include <unicode/locid.h>
 
 namespace kyn::platform {
 namespace {
@@ -67,6 +69,19 @@ TEST(LanguageTags, BecomeIcuLocaleIds) {
   EXPECT_EQ(icuLocaleId("de_CH"), "de_CH");
   EXPECT_EQ(icuLocaleId("zh-Hant-TW"), "zh_Hant_TW");
   EXPECT_EQ(icuLocaleId(""), "root");
+}
+
+TEST(Localization, TheSystemLanguageIsTheDefaultLocaleUnlessThatIsThePosixOne) {
+  const icu::Locale before = icu::Locale::getDefault();
+  const std::pair<const char*, std::optional<std::string>> cases[] = {
+      {"de_CH", "de-CH"}, {"fr", "fr"}, {"en_US_POSIX", std::nullopt}, {"c", std::nullopt}, {"", std::nullopt}};
+  for (const auto& [id, tag] : cases) {
+    UErrorCode status = U_ZERO_ERROR;
+    icu::Locale::setDefault(icu::Locale(id), status);
+    EXPECT_EQ(systemLanguageTag(), tag) << id;
+  }
+  UErrorCode status = U_ZERO_ERROR;
+  icu::Locale::setDefault(before, status);
 }
 
 }  // namespace

@@ -38,15 +38,15 @@ class VCardContactStoreTest : public test::PlatformTest {
 };
 
 TEST_F(VCardContactStoreTest, AFolderIsReadRecursivelyInFileNameOrderAndAFileOnItsOwn) {
-  book.write("b.vcf", test::vcard("FN:Bee\r\nEMAIL:shared@example.com\r\n"));
+  for (const char* name : {"y.vcf", "d.vcf", "b.vcf"}) book.write(name, test::vcard("EMAIL:shared@example.com\r\n"));
   book.write("a.VCF", test::vcard("FN:Ay\r\nEMAIL:shared@example.com\r\n") + test::vcard("FN:Ay Two\r\nEMAIL:shared@example.com\r\n"));
   book.write("sub/c.vcf", test::vcard("FN:Sea\r\nEMAIL:shared@example.com\r\n"));
   book.write("notes.txt", test::vcard("FN:Not A Contact\r\nEMAIL:shared@example.com\r\n"));
   book.write("z\xE9.vcf", test::vcard("EMAIL:shared@example.com\r\n"));  // a file name that is no UTF-8
   VCardContactStore folder(book.path(), "us");
-  EXPECT_EQ(folder.load(), 5u);
+  EXPECT_EQ(folder.load(), 7u);
   EXPECT_EQ(identifiersOf(byEmail(folder, "shared@example.com")),
-            (std::vector<std::string>{"a.VCF#0", "a.VCF#1", "b.vcf#0", "sub/c.vcf#0", "z%E9.vcf#0"}));
+            (std::vector<std::string>{"a.VCF#0", "a.VCF#1", "b.vcf#0", "d.vcf#0", "sub/c.vcf#0", "y.vcf#0", "z%E9.vcf#0"}));
 
   VCardContactStore single(book.path() / "sub" / "c.vcf", "us");
   EXPECT_EQ(single.load(), 1u);
