@@ -57,6 +57,7 @@ TEST(NumberFormatting, DecimalsAreReadAsTheLocaleWritesThem) {
   IcuNumberFormatting en("en_US");
   IcuNumberFormatting de("de_DE");
   EXPECT_EQ(en.parseDecimal("1234.5"), 1234.5);
+  EXPECT_EQ(en.parseDecimal("12345678901234567890"), 12345678901234567890.0);  // too long for the fast path
   EXPECT_EQ(en.parseDecimal("1,234.5"), 1234.5);
   EXPECT_EQ(de.parseDecimal("1234,5"), 1234.5);
   EXPECT_EQ(de.parseDecimal("1.234,5"), 1234.5);

@@ -213,22 +213,6 @@ std::optional<std::string> convertWith(const char* charset, std::string_view byt
   return repairUtf8(utf8FromUnicode(text));
 }
 
-// Latin-1 as the last resort: every byte is a character, so nothing is lost.
-std::string latin1ToUtf8(std::string_view bytes) {
-  std::string out;
-  out.reserve(bytes.size() * 2);
-  for (char ch : bytes) {
-    const auto c = static_cast<unsigned char>(ch);
-    if (c < 0x80) {
-      out.push_back(ch);
-    } else {
-      out.push_back(static_cast<char>(0xC0 | (c >> 6)));
-      out.push_back(static_cast<char>(0x80 | (c & 0x3F)));
-    }
-  }
-  return out;
-}
-
 // Text bytes in `charset` as UTF-8. Without a charset (or with one that ICU does not know) the
 // bytes are UTF-8 when they are valid UTF-8 and windows-1252 otherwise, the usual other choice of
 // old exporters; declared UTF-8 keeps its valid parts and marks the rest with U+FFFD.
@@ -245,8 +229,9 @@ std::string toUtf8(std::string bytes, std::string_view charset) {
     }
     if (isValidUtf8(bytes)) return bytes;
   }
+  // ICU's windows-1252 converter maps every byte (the few unassigned ones to U+FFFD).
   if (auto converted = convertWith("windows-1252", bytes)) return *converted;
-  return latin1ToUtf8(bytes);
+  return repairUtf8(std::move(bytes));
 }
 
 // ---------------------------------------------------------------------------------------------
