@@ -7,7 +7,7 @@
 #include "support/PlatformTest.h"
 
 #include <algorithm>
-#include <regex>
+#include <sstream>
 
 namespace kyn::platform {
 namespace {
@@ -21,7 +21,16 @@ TEST_F(VCardExports, EveryCardIsReadAndFoundByEachOfItsAddressesAndNumbers) {
   const auto has = [](const auto& found, const std::string& id) {
     return std::any_of(found.begin(), found.end(), [&](const auto& c) { return c->identifier == id; });
   };
-  const std::regex begin("^begin:vcard[ \r]*$", std::regex::icase | std::regex::multiline);
+  const auto beginLines = [](const std::string& text) {  // the samples embed no cards in others
+    std::size_t count = 0;
+    std::istringstream lines(text);
+    for (std::string line; std::getline(lines, line);) {
+      while (!line.empty() && (line.back() == '\r' || line.back() == ' ')) line.pop_back();
+      std::transform(line.begin(), line.end(), line.begin(), [](unsigned char c) { return std::toupper(c); });
+      count += line == "BEGIN:VCARD" ? 1 : 0;
+    }
+    return count;
+  };
   std::size_t files = 0, contacts = 0, photos = 0;
   for (const auto& entry : std::filesystem::directory_iterator(*folder)) {
     if (entry.path().extension() != ".vcf") continue;
@@ -31,7 +40,7 @@ TEST_F(VCardExports, EveryCardIsReadAndFoundByEachOfItsAddressesAndNumbers) {
     const VCardParseResult parsed = parseVCards(text, entry.path().filename().string());
     EXPECT_TRUE(parsed.skipped.empty());
     EXPECT_TRUE(parsed.unread.empty()) << parsed.unread;
-    EXPECT_EQ(parsed.contacts.size(), std::distance(std::sregex_iterator(text.begin(), text.end(), begin), {}));
+    EXPECT_EQ(parsed.contacts.size(), beginLines(text));
 
     VCardContactStore store(entry.path(), "us");
     for (const Contact& card : parsed.contacts) {
