@@ -8,6 +8,7 @@
 #include <cmath>
 #include <deque>
 #include <memory>
+#include <mutex>
 #include <unordered_map>
 #include <utility>
 #include <vector>
@@ -229,10 +230,38 @@ class Converter {
   std::size_t maxDepth_;
 };
 
-/// Texts up to this size are read by a parser kept per thread, which keeps its buffers (about
-/// fourteen bytes per byte of text); a larger one gets a parser of its own, so that one large
-/// answer does not hold its memory for good. Keeping it saves nothing measurable at that size.
+/// Texts up to this size are read by a kept parser, which keeps its buffers (about fourteen bytes
+/// per byte of text); a larger one gets a parser of its own, so that one large answer does not
+/// hold its memory for good. Keeping it saves nothing measurable at that size.
 constexpr std::size_t kKeptParserBytes = 256u * 1024u;
+
+/// The kept parsers, lent out one per reading under a lock. Not thread-local: the plug-in may be
+/// unloaded while the host's threads live on, and their thread-local storage of an unloaded
+/// library is left dangling (the leak checker trips over it).
+class ParserPool {
+ public:
+  std::unique_ptr<simdjson::dom::parser> take() {
+    {
+      std::lock_guard lock(mutex_);
+      if (!idle_.empty()) {
+        auto parser = std::move(idle_.back());
+        idle_.pop_back();
+        return parser;
+      }
+    }
+    return std::make_unique<simdjson::dom::parser>();
+  }
+  void giveBack(std::unique_ptr<simdjson::dom::parser> parser) noexcept {
+    std::lock_guard lock(mutex_);
+    if (idle_.size() < kKept) idle_.push_back(std::move(parser));  // reserved: never throws
+  }
+  ParserPool() { idle_.reserve(kKept); }
+
+ private:
+  static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
+  std::mutex mutex_;
+  std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
+};
 
 /// The text read by simdjson, several times faster than nlohmann's own reader; nothing when
 /// simdjson refuses it, and then nlohmann's reader decides.
@@ -242,13 +271,17 @@ std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) 
   for (std::size_t at = text.find("\\u"); at != std::string_view::npos; at = text.find("\\u", at + 2)) {
     if (at + 2 < text.size() && (text[at + 2] == 'd' || text[at + 2] == 'D')) return std::nullopt;
   }
-  thread_local simdjson::dom::parser kept;
-  std::unique_ptr<simdjson::dom::parser> own;
-  simdjson::dom::parser* parser = &kept;
-  if (text.size() > kKeptParserBytes) {
-    own = std::make_unique<simdjson::dom::parser>();
-    parser = own.get();
-  }
+  static ParserPool pool;
+  const bool keep = text.size() <= kKeptParserBytes;
+  auto parser = keep ? pool.take() : std::make_unique<simdjson::dom::parser>();
+  struct GiveBack {
+    ParserPool& pool;
+    std::unique_ptr<simdjson::dom::parser>& parser;
+    bool keep;
+    ~GiveBack() {
+      if (keep) pool.giveBack(std::move(parser));
+    }
+  } giveBack{pool, parser, keep};
   simdjson::dom::element root;
   if (parser->parse(text.data(), text.size()).get(root) != simdjson::SUCCESS) return std::nullopt;
   Value value;
