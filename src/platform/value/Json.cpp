@@ -16,6 +16,9 @@
 namespace kyn::platform {
 namespace {
 
+/// Objects with more members than this get a hash index of their keys while they are read.
+constexpr std::size_t kIndexThreshold = 16;
+
 // Builds a Value from nlohmann's SAX events. Unlike the library's own DOM builder it bounds the
 // nesting depth, rejects non-finite numbers, and indexes large objects so that checking each new key
 // for a duplicate stays constant time (an ordered object otherwise searches its members linearly,
@@ -110,7 +113,6 @@ class Builder {
   Value take() { return std::move(root_); }
 
  private:
-  static constexpr std::size_t kIndexThreshold = 16;
   static constexpr std::size_t kUnknownSize = static_cast<std::size_t>(-1);
   using Members = std::vector<std::pair<std::string, Value>>;
 
@@ -226,7 +228,6 @@ class Converter {
   }
 
  private:
-  static constexpr std::size_t kIndexThreshold = 16;
   std::size_t maxDepth_;
 };
 
