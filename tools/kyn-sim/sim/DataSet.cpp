@@ -268,13 +268,19 @@ const Account* DataSet::holder(std::string_view handle) const {
   return nullptr;
 }
 
+const Whereabouts* DataSet::shownWhereabouts(std::string_view handle) const {
+  const Whereabouts* w = whereabouts(handle);
+  if (!w) return nullptr;
+  const Account* holderOf = holder(handle);
+  return holderOf && holderOf->hidden ? nullptr : w;
+}
+
 AccountView DataSet::view(std::size_t account) const {
   AccountView view;
   view.serverContext = serverContext;
   for (const auto& friendship : accounts.at(account).friends) {
     Friend f{friendship.handle, friendship.pending, {}};
-    const Account* holderOf = holder(friendship.handle);
-    if (const Whereabouts* w = whereabouts(friendship.handle); w && !(holderOf && holderOf->hidden)) f.whereabouts = *w;
+    if (const Whereabouts* w = shownWhereabouts(friendship.handle)) f.whereabouts = *w;
     view.friends.push_back(std::move(f));
   }
   return view;

@@ -74,6 +74,8 @@ struct DataSet {
   [[nodiscard]] const Whereabouts* whereabouts(std::string_view handle) const;
   /// The account whose holder has this handle, or nothing.
   [[nodiscard]] const Account* holder(std::string_view handle) const;
+  /// The whereabouts others may see: none when nobody gave them or their holder hides.
+  [[nodiscard]] const Whereabouts* shownWhereabouts(std::string_view handle) const;
   /// What `account` sees: its friends with their whereabouts, none for a friend who hides.
   [[nodiscard]] AccountView view(std::size_t account) const;
 };

@@ -36,6 +36,16 @@ std::string garbage() {
   return out;
 }
 
+// A request the endpoint refuses as malformed answers 400 with the reason.
+template <class Answer>
+Reply refusingBadRequests(Answer&& answer) {
+  try {
+    return answer();
+  } catch (const BadRequest& e) {
+    return errorReply(400, e.what());
+  }
+}
+
 Reply redirectReply(std::string location) {
   Reply r;
   r.status = 307;
@@ -105,15 +115,13 @@ Router::Router(DataSet data, Authoriser authoriser, RouterOptions options, World
   addEndpoint(
       std::string(kMovePath),
       [this](std::size_t, const Json& body, std::int64_t nowMs) {
-        try {
+        return refusingBadRequests([&] {
           auto moved = answerMove(world_, body, nowMs);
           if (!moved) return errorReply(404, "nobody in the data set has the handle " + body.value("handle", ""));
           Json answer = {{"statusCode", 200}};
           answer.update(*moved);
           return jsonReply(200, answer);
-        } catch (const BadRequest& e) {
-          return errorReply(400, e.what());
-        }
+        });
       },
       false);
 }
@@ -128,11 +136,7 @@ void Router::addProtocolEndpoint(std::string_view path,
   addEndpoint(
       std::string(path),
       [answer = std::move(answer)](std::size_t account, const Json& body, std::int64_t nowMs) {
-        try {
-          return jsonReply(200, answer(account, body, nowMs));
-        } catch (const BadRequest& e) {
-          return errorReply(400, e.what());
-        }
+        return refusingBadRequests([&] { return jsonReply(200, answer(account, body, nowMs)); });
       },
       faultable);
 }

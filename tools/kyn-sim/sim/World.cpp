@@ -159,9 +159,8 @@ World::Placed World::locate(std::size_t owner, const FenceRequest& request,
 }
 
 std::optional<Coordinate> World::seenBy(std::size_t owner, std::string_view handle) const {
-  const Whereabouts* w = data_.whereabouts(handle);
+  const Whereabouts* w = data_.shownWhereabouts(handle);
   if (!w || !w->coordinate) return std::nullopt;
-  if (const Account* holder = data_.holder(handle); holder && holder->hidden) return std::nullopt;
   const auto& friends = data_.accounts[owner].friends;
   const bool pending = std::any_of(friends.begin(), friends.end(), [&](const Friendship& f) {
     return f.pending && handleKey(f.handle) == handleKey(handle);
