@@ -5,6 +5,7 @@
 #include <simdjson.h>
 
 #include <algorithm>
+#include <atomic>
 #include <charconv>
 #include <cstring>
 #include <limits>
@@ -319,8 +320,15 @@ class ParserPool {
     if (idle_.size() < kKept) idle_.push_back(std::move(parser));  // reserved: never throws
   }
   ParserPool() { idle_.reserve(kKept); }
+  ParserPool(const ParserPool&) = delete;
+  ParserPool& operator=(const ParserPool&) = delete;
+  ~ParserPool() { gone_.store(true); }
+  /// A document may outlive the pool at the process's (or the plug-in's) end: its parser is then
+  /// simply freed. The flag needs no destruction, so it can be read after the pool's.
+  [[nodiscard]] static bool gone() noexcept { return gone_.load(); }
 
  private:
+  static inline std::atomic<bool> gone_{false};
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
   std::mutex mutex_;
   std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
@@ -426,7 +434,7 @@ struct JsonDocument::Storage {
   Storage& operator=(const Storage&) = delete;
   ~Storage() {
     releaseValue(value);
-    if (kept && parser) parserPool().giveBack(std::move(parser));
+    if (kept && parser && !ParserPool::gone()) parserPool().giveBack(std::move(parser));
   }
 };
 
