@@ -647,39 +647,36 @@ Value JsonView::toValue() const {
 
 JsonView::Iterator JsonView::begin() const noexcept {
   Iterator it;
-  it.parent_ = this;
-  if (kind_ == Kind::Document && (isArray() || isObject())) it.at_ = index_ + 1;
+  it.container_ = ptr_;
+  it.document_ = kind_ == Kind::Document;
+  it.object_ = isObject();
+  if (it.document_ && (it.object_ || isArray())) it.at_ = index_ + 1;
   return it;
 }
 
 JsonView::Iterator JsonView::end() const noexcept {
-  Iterator it;
-  it.parent_ = this;
+  Iterator it = begin();
   if (kind_ == Kind::Tree && tree().is_structured()) it.at_ = tree().size();
-  if (kind_ == Kind::Document && (isArray() || isObject())) it.at_ = closing(documentOf(ptr_), index_);
+  if (kind_ == Kind::Document && (it.object_ || isArray())) it.at_ = closing(documentOf(ptr_), index_);
   return it;
 }
 
 JsonView::Entry JsonView::Iterator::operator*() const noexcept {
-  const JsonView& parent = *parent_;
-  if (parent.kind_ == Kind::Tree) {
-    const Value& v = parent.tree();
-    if (v.is_array()) return {{}, &v.get_ref<const Value::array_t&>()[at_]};
+  if (!document_) {
+    const Value& v = *static_cast<const Value*>(container_);
+    if (!object_) return {{}, &v.get_ref<const Value::array_t&>()[at_]};
     const auto& members = static_cast<const Value::object_t::Container&>(v.get_ref<const Value::object_t&>());
     return {members[at_].first, &members[at_].second};
   }
-  const Document& document = documentOf(parent.ptr_);
-  if (typeAt(document, parent.index_) == '[') return {{}, inDocument(parent.ptr_, at_)};
-  return {stringAt(document, at_), inDocument(parent.ptr_, at_ + 1)};
+  if (!object_) return {{}, inDocument(container_, at_)};
+  return {stringAt(documentOf(container_), at_), inDocument(container_, at_ + 1)};
 }
 
 JsonView::Iterator& JsonView::Iterator::operator++() noexcept {
-  const JsonView& parent = *parent_;
-  if (parent.kind_ == Kind::Tree) {
+  if (!document_) {
     ++at_;
   } else {
-    const Document& document = documentOf(parent.ptr_);
-    at_ = after(document, typeAt(document, parent.index_) == '{' ? at_ + 1 : at_);
+    at_ = after(documentOf(container_), object_ ? at_ + 1 : at_);
   }
   return *this;
 }

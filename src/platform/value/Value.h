@@ -71,8 +71,10 @@ class JsonView {
 
    private:
     friend class JsonView;
-    const JsonView* parent_ = nullptr;
+    const void* container_ = nullptr;  // the array or object, as its view holds it
     std::size_t at_ = 0;  // a tree: the position; a document: the index of the entry
+    bool document_ = false;
+    bool object_ = false;
   };
   [[nodiscard]] Iterator begin() const noexcept;
   [[nodiscard]] Iterator end() const noexcept;
