@@ -112,8 +112,9 @@ class AnsweringController final : public platform::KYServerInteractionController
 std::string performHere(const std::string& commandJson) {
   std::string text;
   auto reply = [&](const AXReply& r) { text = r.json(); };
-  const auto command = platform::parseJson(commandJson).value();
-  const std::string className = command["class"].get<std::string>();
+  const auto document = platform::parseJsonDocument(commandJson).value();
+  const platform::JsonView command = document.root();
+  const std::string className = platform::stringValue(command.member("class")).value();
   if (className == AXKynSearch::kClassName) {
     auto search = std::make_shared<KYNAXSearch>();
     AXKynSearch::readFields(*search, command);

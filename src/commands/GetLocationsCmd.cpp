@@ -9,7 +9,6 @@
 
 namespace kyn {
 
-using platform::member;
 using platform::services;
 
 std::string GetLocationsCmd::path() const { return std::string(KYNUrlBase) + "getlocations"; }
@@ -65,31 +64,34 @@ Value GetLocationsCmd::jsonBodyDictionary() const {
 
 AXArray<AXKynLocation> GetLocationsCmd::result() {
   auto& log = services().log();
-  const Value* response = jsonResponseDictionary();
+  const platform::JsonView response = jsonResponse();
   log.notice("getlocations_resultDictionary_raw: %@", response);
 
-  const Value* locations = member(response, "locations");
-  if (locations != nullptr && !locations->is_object()) locations = nullptr;  // null or the wrong type
-  const Value* handlesToReport = member(response, "emails");
+  platform::JsonView locations = response.member("locations");
+  if (!locations.isObject()) locations = {};  // null or the wrong type
+  const platform::JsonView handlesToReport = response.member("emails");
   const bool incomplete = platform::int32Value(statusCodeValue()) == 416;
-  if (response == nullptr) return std::nullopt;
+  if (!response) return std::nullopt;
 
   std::vector<std::shared_ptr<AXKynLocation>> found;
 
   std::optional<Value> context;
-  if (const Value* serverContext = member(response, "serverContext"); serverContext && serverContext->is_object()) {
-    context = *serverContext;
+  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
+    context = serverContext.toValue();
     if (incomplete) (*context)["incomplete"] = true;
   }
   log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
   setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
 
   // Each handle is looked up once: index the entries and the friends first, so that the walk stays
-  // linear in the number of friends (an ordered object searches its members one by one).
-  std::unordered_map<std::string_view, const Value*> entries;
-  if (locations != nullptr) {
-    entries.reserve(locations->size());
-    for (const auto& [handle, entry] : locations->items()) entries.emplace(handle, &entry);
+  // linear in the number of friends. Of a handle the answer repeats, the last entry counts, at the
+  // place of the first.
+  std::unordered_map<std::string_view, platform::JsonView> entries;
+  std::vector<std::string_view> entryOrder;
+  entries.reserve(locations.size());
+  entryOrder.reserve(locations.size());
+  for (const auto& [handle, entry] : locations) {
+    if (entries.insert_or_assign(handle, entry).second) entryOrder.push_back(handle);
   }
   std::unordered_map<std::string_view, std::shared_ptr<AXPerson>> personForHandle;
   if (friends) {
@@ -109,23 +111,24 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
     }
   }
 
-  auto visit = [&](const std::string& handle) {
+  found.reserve(handlesToReport.isArray() ? handlesToReport.size() : entryOrder.size());
+  auto visit = [&](std::string_view handle) {
     const auto entryIt = entries.find(handle);
-    const Value* entry = entryIt == entries.end() ? nullptr : entryIt->second;
-    if (platform::integerValue(member(entry, "status")) == 411) return;  // not a friend: left out
+    const platform::JsonView entry = entryIt == entries.end() ? platform::JsonView() : entryIt->second;
+    if (platform::integerValue(entry.member("status")) == 411) return;  // not a friend: left out
     const auto personIt = personForHandle.find(handle);
     auto person = personIt == personForHandle.end() ? nullptr : personIt->second;
-    auto record = KYNAXLocation::locationWithHandle(handle, std::move(person), entry);
+    auto record = KYNAXLocation::locationWithHandle(std::string(handle), std::move(person), entry);
     if (record->avixLocation) found.push_back(record->avixLocation);
-    atRequestedLocation = platform::boolValue(member(entry, "match")).value_or(false);
+    atRequestedLocation = platform::boolValue(entry.member("match")).value_or(false);
   };
 
-  if (handlesToReport != nullptr && handlesToReport->is_array() && !handlesToReport->empty()) {
-    for (const Value& handle : *handlesToReport) {
-      if (handle.is_string()) visit(handle.get_ref<const std::string&>());
+  if (handlesToReport.isArray() && handlesToReport.size() > 0) {
+    for (const auto& item : handlesToReport) {
+      if (const auto handle = item.value.string()) visit(*handle);
     }
-  } else if (locations != nullptr) {
-    for (const auto& [handle, _] : locations->items()) visit(handle);
+  } else {
+    for (const std::string_view handle : entryOrder) visit(handle);
   }
 
   log.notice("location result: %@", found);

@@ -27,16 +27,15 @@ Value KYNBaseCmd::jsonBodyDictionary() const {
   return body;
 }
 
-const Value* KYNBaseCmd::jsonResponseDictionary() {
-  const Value* response = KYJSONCommand::jsonResponseDictionary();
-  const Value* code = platform::memberNotNull(response, "statusCode");
-  statusCode_ = code ? std::optional<Value>(*code) : std::nullopt;
+platform::JsonView KYNBaseCmd::jsonResponse() {
+  const platform::JsonView response = KYJSONCommand::jsonResponse();
+  const platform::JsonView code = response.memberNotNull("statusCode");
+  statusCode_ = code ? std::optional<Value>(code.toValue()) : std::nullopt;
   return response;
 }
 
 double KYNBaseCmd::minCallbackInterval() {
-  const Value* context = platform::member(jsonResponseDictionary(), "serverContext");
-  const auto ms = platform::numberValue(platform::member(context, "minCallbackIntervalInMS"));
+  const auto ms = platform::numberValue(jsonResponse().member("serverContext").member("minCallbackIntervalInMS"));
   return ms ? *ms / 1000.0 : 0.0;
 }
 

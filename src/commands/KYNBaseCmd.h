@@ -25,7 +25,7 @@ class KYNBaseCmd : public platform::KYJSONCommand {
   /// The base body plus "clientContext".
   [[nodiscard]] Value jsonBodyDictionary() const override;
   /// The parsed response, unchanged; sets `statusCode` from it (nothing when absent or null).
-  [[nodiscard]] const Value* jsonResponseDictionary() override;
+  [[nodiscard]] platform::JsonView jsonResponse() override;
   /// "minCallbackIntervalInMS" of the response's "serverContext", in seconds; 0 when absent.
   [[nodiscard]] double minCallbackInterval() override;
 

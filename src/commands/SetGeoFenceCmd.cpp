@@ -88,22 +88,26 @@ Value SetGeoFenceCmd::jsonBodyDictionary() const {
 }
 
 std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
-  const Value* response = jsonResponseDictionary();
+  const platform::JsonView response = jsonResponse();
   services().log().notice("setgeofence_resultDictionary_raw: %@", response);
-  const Value* fence = memberNotNull(response, "fence");
-  const Value* fullAddress = memberNotNull(response, "fullAddress");
+  const platform::JsonView fence = response.memberNotNull("fence");
+  const platform::JsonView fullAddress = response.memberNotNull("fullAddress");
 
   // The handle the server answered for, else the friend's last one.
   std::optional<std::string> handle;
-  if (const Value* emails = memberNotNull(fence, "emails"); emails && emails->is_array() && !emails->empty()) {
-    handle = platform::stringValue(&emails->back());
+  if (const platform::JsonView emails = fence.memberNotNull("emails"); emails.isArray()) {
+    platform::JsonView last;
+    for (const auto& item : emails) last = item.value;
+    if (last) handle = platform::stringValue(last);
   }
   if (!handle || handle->empty()) {
     auto handles = allHandles();
     handle = handles.empty() ? std::nullopt : std::optional(std::move(handles.back()));
   }
 
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(member(response, "serverContext")));
+  const platform::JsonView serverContext = response.member("serverContext");
+  const Value context = serverContext.isObject() ? serverContext.toValue() : Value();
+  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(serverContext.isObject() ? &context : nullptr));
 
   auto geoFence = std::make_shared<AXKynGeoFence>();
   geoFence->trigger = trigger;
@@ -112,8 +116,8 @@ std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
   geoFence->friend_->data = handle;
 
   // A fence switched off comes back without a place: the place is the one this request named.
-  const Value* coordinates = fence;
-  const Value* address = fullAddress;
+  platform::JsonView coordinates = fence;
+  platform::JsonView address = fullAddress;
   Value body;
   if (!enable && !fence && !fullAddress && platform::int32Value(statusCodeValue()) == 221) {
     body = jsonBodyDictionary();
@@ -122,11 +126,11 @@ std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
   }
 
   auto place = std::make_shared<AXLocation>();
-  place->latitude = platform::numberValue(member(coordinates, "latitude"));
-  place->longitude = platform::numberValue(member(coordinates, "longitude"));
+  place->latitude = platform::numberValue(coordinates.member("latitude"));
+  place->longitude = platform::numberValue(coordinates.member("longitude"));
   place->accuracy = 0.0;
   place->label = location_ ? location_->label : std::nullopt;
-  place->street = platform::stringValue(member(address, "streetAddress"));
+  place->street = platform::stringValue(address.member("streetAddress"));
   geoFence->location = std::move(place);
   return geoFence;
 }

@@ -6,11 +6,10 @@
 
 namespace kyn {
 
-using platform::member;
 using platform::services;
 
 std::string ShowHideLocationResult::description() const {
-  return "(" + platform::toJson(response) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
+  return "(" + platform::toJson(response.toValue()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
 }
 
 std::string ShowHideLocationCmd::path() const { return std::string(KYNUrlBase) + "showHideLocation"; }
@@ -30,24 +29,25 @@ Value ShowHideLocationCmd::jsonBodyDictionary() const {
 
 std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
   auto& log = services().log();
-  const Value* response = jsonResponseDictionary();
-  if (response == nullptr) return nullptr;
+  const platform::JsonView response = jsonResponse();
+  if (!response) return nullptr;
   auto out = std::make_shared<ShowHideLocationResult>();
-  out->response = *response;
+  out->response = response;
+  out->responseDocument = responseDocument();
 
-  const Value* myInfo = member(response, "myInfo");
-  if (myInfo != nullptr && !myInfo->is_object()) myInfo = nullptr;
+  platform::JsonView myInfo = response.member("myInfo");
+  if (!myInfo.isObject()) myInfo = {};
   std::optional<Value> context;
-  if (const Value* serverContext = member(response, "serverContext"); serverContext && serverContext->is_object()) {
-    context = *serverContext;
+  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
+    context = serverContext.toValue();
   }
-  const auto preferredEmail = platform::stringValue(member(myInfo, "preferredEmail"));
+  const auto preferredEmail = platform::stringValue(myInfo.member("preferredEmail"));
   // Folded into the server's context only: without one there is nothing to carry back.
   if (preferredEmail && context) (*context)["preferredEmail"] = *preferredEmail;
   log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
   setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
   if (log.isEnabled(platform::LogLevel::Default)) {
-    log.notice("visibility_response: %@", "(" + platform::toJson(out->response) + ")");  // the record is not in yet
+    log.notice("visibility_response: %@", "(" + platform::toJson(out->response.toValue()) + ")");  // the record is not in yet
   }
 
   // The record shows what was asked for: once the exchange succeeded, the request is trusted.

@@ -7,12 +7,11 @@
 #include "platform/text/Unicode.h"
 #include "utils/KYNAXUtils.h"
 
+#include <array>
 #include <cmath>
 
 namespace kyn {
 
-using platform::member;
-using platform::memberNotNull;
 using platform::services;
 
 namespace {
@@ -21,30 +20,22 @@ namespace {
 constexpr std::string_view kDistanceCalculatorSuiteName = "group.com.zanto.aerix.ky";
 
 /// A member that must be a JSON object to be read; anything else (null included) is absent.
-const Value* objectMember(const Value* object, std::string_view key) {
-  const Value* v = member(object, key);
-  return (v != nullptr && v->is_object()) ? v : nullptr;
-}
-
-std::optional<double> number(const Value* object, std::string_view key) {
-  return platform::numberValue(member(object, key));
-}
-
-std::optional<std::string> text(const Value* object, std::string_view key) {
-  return platform::stringValue(member(object, key));
+platform::JsonView objectMember(platform::JsonView object, std::string_view key) {
+  const platform::JsonView v = object.member(key);
+  return v.isObject() ? v : platform::JsonView();
 }
 
 }  // namespace
 
 KYNAXLocation::KYNAXLocation(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
-                             const Value* entry) {
+                             platform::JsonView entry) {
   decodeHandle(handle, std::move(person), entry);
 }
 
 KYNAXLocation::KYNAXLocation(std::shared_ptr<AXKynLocation> location) : avixLocation(std::move(location)) {}
 
 std::shared_ptr<KYNAXLocation> KYNAXLocation::locationWithHandle(const std::optional<std::string>& handle,
-                                                                 std::shared_ptr<AXPerson> person, const Value* entry) {
+                                                                 std::shared_ptr<AXPerson> person, platform::JsonView entry) {
   return std::make_shared<KYNAXLocation>(handle, std::move(person), entry);
 }
 
@@ -59,7 +50,7 @@ std::shared_ptr<platform::NumberFormatting> KYNAXLocation::numberFormatter() {
 std::shared_ptr<platform::Localization> KYNAXLocation::bundle() { return services().localization.get(); }
 
 void KYNAXLocation::decodeHandle(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
-                                 const Value* entry) {
+                                 platform::JsonView entry) {
   auto location = std::make_shared<AXKynLocation>();
   avixLocation = location;
 
@@ -74,29 +65,38 @@ void KYNAXLocation::decodeHandle(const std::optional<std::string>& handle, std::
   attribute->data = handle;
   location->friend_ = attribute;
 
-  if (const Value* distance = member(entry, "distanceInMeters")) {
+  if (const platform::JsonView distance = entry.member("distanceInMeters")) {
     // The server sends the distance as text; it is read as the user's locale writes numbers.
     // A value that is no text reads as no distance.
-    location->distance = distance->is_string() ? numberFormatter()->parseDecimal(distance->get_ref<const std::string&>())
-                                               : std::nullopt;
+    const auto written = distance.string();
+    location->distance = written ? numberFormatter()->parseDecimal(*written) : std::nullopt;
   }
 
-  const Value* fix = objectMember(entry, "location");
-  const Value* address = objectMember(fix, "address");
-  location->city = text(address, "locality");
+  const platform::JsonView fix = objectMember(entry, "location");
+  // Each object's members are read in one walk over it.
+  enum { kAddress, kLatitude, kLongitude, kAccuracy, kTimestamp, kStreet, kLabels, kFixKeys };
+  static constexpr std::array<std::string_view, kFixKeys> fixKeys{
+      "address", "latitude", "longitude", "horizontalAccuracy", "timestamp", "streetAddress", "labels"};
+  std::array<platform::JsonView, kFixKeys> fixed;
+  fix.members(fixKeys, fixed);
+  enum { kLocality, kStateCode, kAdministrativeArea, kAddressKeys };
+  static constexpr std::array<std::string_view, kAddressKeys> addressKeys{"locality", "stateCode", "administrativeArea"};
+  std::array<platform::JsonView, kAddressKeys> address;
+  if (fixed[kAddress].isObject()) fixed[kAddress].members(addressKeys, address);
+
+  location->city = platform::stringValue(address[kLocality]);
   // The administrative area stands in only when the state code is missing altogether; a state
   // code that is present as null stays null.
-  location->stateCode = member(address, "stateCode") != nullptr ? text(address, "stateCode")
-                                                                 : text(address, "administrativeArea");
-  location->latitude = number(fix, "latitude");
-  location->longitude = number(fix, "longitude");
-  location->accuracy = number(fix, "horizontalAccuracy");
-  location->locationDate = KYNAXUtils::timeIntervalForMillisecondsSince1970(number(fix, "timestamp"));
-  location->street = text(fix, "streetAddress");
+  location->stateCode = platform::stringValue(address[kStateCode] ? address[kStateCode] : address[kAdministrativeArea]);
+  location->latitude = platform::numberValue(fixed[kLatitude]);
+  location->longitude = platform::numberValue(fixed[kLongitude]);
+  location->accuracy = platform::numberValue(fixed[kAccuracy]);
+  location->locationDate = KYNAXUtils::timeIntervalForMillisecondsSince1970(platform::numberValue(fixed[kTimestamp]));
+  location->street = platform::stringValue(fixed[kStreet]);
 
-  if (const Value* labels = memberNotNull(fix, "labels"); labels != nullptr && labels->is_array()) {
-    for (const Value& element : *labels) {
-      location->label = text(&element, "label");
+  if (const platform::JsonView labels = fixed[kLabels]; labels.isArray()) {
+    for (const auto& element : labels) {
+      location->label = platform::stringValue(element.value.member("label"));
       if (location->label) break;  // the first label that is there wins
     }
   }

@@ -10,14 +10,14 @@ std::optional<std::string> KYNAXMyLocation::handleFor(const std::optional<std::s
   return Common::sharedInstance().username();
 }
 
-KYNAXMyLocation::KYNAXMyLocation(bool visible, const Value* entry, const std::optional<std::string>& preferredEmail) {
+KYNAXMyLocation::KYNAXMyLocation(bool visible, platform::JsonView entry, const std::optional<std::string>& preferredEmail) {
   decodeHandle(handleFor(preferredEmail), nullptr, entry);
   isVisible = visible;
 }
 
 KYNAXMyLocation::KYNAXMyLocation(bool visible, std::shared_ptr<AXKynLocation> location,
                                  const std::optional<std::string>& preferredEmail) {
-  decodeHandle(handleFor(preferredEmail), nullptr, nullptr);
+  decodeHandle(handleFor(preferredEmail), nullptr, platform::JsonView());
   isVisible = visible;
   if (location) avixLocation = std::move(location);
 }
@@ -27,7 +27,7 @@ std::shared_ptr<KYNAXMyLocation> KYNAXMyLocation::myLocation(bool visible, std::
   return std::make_shared<KYNAXMyLocation>(visible, std::move(location), preferredEmail);
 }
 
-std::shared_ptr<KYNAXMyLocation> KYNAXMyLocation::myLocation(bool visible, const Value* entry,
+std::shared_ptr<KYNAXMyLocation> KYNAXMyLocation::myLocation(bool visible, platform::JsonView entry,
                                                              const std::optional<std::string>& preferredEmail) {
   return std::make_shared<KYNAXMyLocation>(visible, entry, preferredEmail);
 }

@@ -16,11 +16,11 @@ class KYNAXMyLocation : public KYNAXLocation {
   /// is (the user's contact is looked up all the same).
   KYNAXMyLocation(bool visible, std::shared_ptr<AXKynLocation> avixLocation, const std::optional<std::string>& preferredEmail);
   /// A record decoded from `entry` (a friend location entry, or nothing) for the user.
-  KYNAXMyLocation(bool visible, const Value* entry, const std::optional<std::string>& preferredEmail);
+  KYNAXMyLocation(bool visible, platform::JsonView entry, const std::optional<std::string>& preferredEmail);
 
   [[nodiscard]] static std::shared_ptr<KYNAXMyLocation> myLocation(bool visible, std::shared_ptr<AXKynLocation> avixLocation,
                                                                    const std::optional<std::string>& preferredEmail);
-  [[nodiscard]] static std::shared_ptr<KYNAXMyLocation> myLocation(bool visible, const Value* entry,
+  [[nodiscard]] static std::shared_ptr<KYNAXMyLocation> myLocation(bool visible, platform::JsonView entry,
                                                                    const std::optional<std::string>& preferredEmail);
 
   /// The base record's place text while visible; the localised "HIDDEN_LOCATION" otherwise, whatever

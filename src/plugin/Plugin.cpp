@@ -96,9 +96,9 @@ constexpr platform::JsonLimits kDescribeLimits{kMaxCommandBytes, 64};
 
 /// A friend location of a reply, wrapped as it is; nothing for a text that is no JSON object.
 std::shared_ptr<KYNAXLocation> friendLocationFromJson(const char* json) {
-  const auto parsed = platform::parseJson(json, kDescribeLimits);
-  if (!parsed || !parsed->is_object()) return nullptr;
-  return KYNAXLocation::locationWithAvixLocation(AXKynLocation::fromDictionary(*parsed));
+  const auto parsed = platform::parseJsonDocument(json, kDescribeLimits);
+  if (!parsed || !parsed->root().isObject()) return nullptr;
+  return KYNAXLocation::locationWithAvixLocation(AXKynLocation::fromDictionary(parsed->root()));
 }
 
 std::shared_ptr<AXPerson> personForContact(const platform::Contact& contact) {
@@ -118,20 +118,22 @@ std::shared_ptr<AXPerson> personForContact(const platform::Contact& contact) {
 }
 
 void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
-  const auto command = platform::parseJson(commandJson, platform::JsonLimits{kMaxCommandBytes, 64});
-  if (!command || !command->is_object()) return reply->fail("The command is not a JSON object");
-  const auto className = platform::stringValue(platform::member(*command, "class"));
+  // The records are read straight from the parsed text, which lives until they are.
+  const auto document = platform::parseJsonDocument(commandJson, platform::JsonLimits{kMaxCommandBytes, 64});
+  const platform::JsonView command = document ? document->root() : platform::JsonView();
+  if (!command.isObject()) return reply->fail("The command is not a JSON object");
+  const auto className = platform::stringValue(command.member("class"));
   if (!className) return reply->fail("The command names no class");
 
   if (*className == AXKynSearch::kClassName) {
     auto search = std::make_shared<KYNAXSearch>();
-    AXKynSearch::readFields(*search, *command);
+    AXKynSearch::readFields(*search, command);
     search->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
     return;
   }
   if (*className == AXKynVisibilityStateSet::kClassName) {
     auto visibility = std::make_shared<KYNAXVisibility>();
-    AXKynVisibilityStateSet::readFields(*visibility, *command);
+    AXKynVisibilityStateSet::readFields(*visibility, command);
     // Without the flag the command would read as "hide": refused rather than guessed.
     if (!visibility->visible) return reply->fail("The visibility command needs \"visible\": true or false");
     visibility->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
@@ -139,7 +141,7 @@ void perform(const char* commandJson, const std::shared_ptr<ReplyOnce>& reply) {
   }
   if (*className == AXKynGeoFenceSet::kClassName) {
     auto fence = std::make_shared<KYNAXSetGeoFence>();
-    AXKynGeoFenceSet::readFields(*fence, *command);
+    AXKynGeoFenceSet::readFields(*fence, command);
     // Without the flag the command would switch the fence off: refused rather than guessed.
     if (!fence->enable) return reply->fail("The geofence command needs \"enable\": true or false");
     fence->performWithCompletion([reply](const AXReply& r) { reply->deliver(r); });
@@ -232,9 +234,9 @@ char* kyn_plugin_describe_location(const char* location_json, int located, const
     }
     if (auto time = record->prettyTimestamp()) out["time"] = *time;
     if (current_location_json != nullptr) {
-      const auto here = platform::parseJson(current_location_json, plugin::kDescribeLimits);
-      if (here && here->is_object()) {
-        const auto from = KYNAXUtils::coreLocationForAXLocation(AXLocation::fromDictionary(*here));
+      const auto here = platform::parseJsonDocument(current_location_json, plugin::kDescribeLimits);
+      if (here && here->root().isObject()) {
+        const auto from = KYNAXUtils::coreLocationForAXLocation(AXLocation::fromDictionary(here->root()));
         if (auto distance = record->distanceFromLocation(from)) out["distance"] = *distance;
       }
     }

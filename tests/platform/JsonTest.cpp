@@ -64,24 +64,39 @@ TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
   EXPECT_TRUE(parseJson(text));
 }
 
-TEST(Json, ValueReaders) {
-  auto v = *parseJson(R"({"s":"12abc","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"edge":9.223372036854775808e18,"u":18446744073709551615})");
-  EXPECT_EQ(integerValue(member(v, "s")), 12);
-  EXPECT_EQ(integerValue(member(v, "n")), 7);
-  EXPECT_EQ(integerValue(member(v, "neg")), -3);
-  EXPECT_EQ(integerValue(member(v, "b")), 1);
-  EXPECT_EQ(integerValue(member(v, "null")), 0);
-  EXPECT_EQ(integerValue(member(v, "missing")), 0);
-  EXPECT_EQ(integerValue(member(v, "big")), INT64_MAX);
-  EXPECT_EQ(integerValue(member(v, "edge")), INT64_MAX);  // 2^63 itself does not fit either
-  EXPECT_EQ(integerValue(member(v, "u")), INT64_MAX);
-  EXPECT_EQ(member(v, "null")->is_null(), true);
-  EXPECT_EQ(memberNotNull(&v, "null"), nullptr);
-  EXPECT_FALSE(numberValue(member(v, "b")));
-  EXPECT_FALSE(stringValue(member(v, "n")));
+// The readers give the same answers on a tree and on a parsed document read in place.
+TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
+  const std::string text =
+      R"({"s":"x","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"edge":9.223372036854775808e18,)"
+      R"("u":18446744073709551615,"i":-5,"a":[1,{"k":2},"z"],"s":"12abc"})";
+  const Value tree = *parseJson(text);
+  const auto document = parseJsonDocument(text);
+  ASSERT_TRUE(document);
+  for (const JsonView v : {JsonView(&tree), document->root()}) {
+    EXPECT_EQ(integerValue(v.member("s")), 12);  // a repeated key: the last value
+    EXPECT_EQ(integerValue(v.member("n")), 7);
+    EXPECT_EQ(integerValue(v.member("neg")), -3);
+    EXPECT_EQ(integerValue(v.member("i")), -5);
+    EXPECT_EQ(integerValue(v.member("b")), 1);
+    EXPECT_EQ(integerValue(v.member("null")), 0);
+    EXPECT_EQ(integerValue(v.member("missing")), 0);
+    EXPECT_EQ(integerValue(v.member("big")), INT64_MAX);
+    EXPECT_EQ(integerValue(v.member("edge")), INT64_MAX);  // 2^63 itself does not fit either
+    EXPECT_EQ(integerValue(v.member("u")), INT64_MAX);
+    EXPECT_EQ(int32Value(v.member("u")), -1);
+    EXPECT_TRUE(v.member("null").isNull());
+    EXPECT_FALSE(v.memberNotNull("null"));
+    EXPECT_FALSE(numberValue(v.member("b")));
+    EXPECT_EQ(boolValue(v.member("neg")), true);
+    EXPECT_FALSE(stringValue(v.member("n")));
+    EXPECT_FALSE(v.member("a").member("k"));
+    std::vector<std::string> items;
+    for (const auto& item : v.member("a")) items.push_back(toJson(item.value.toValue()));
+    EXPECT_EQ(items, (std::vector<std::string>{"1", R"({"k":2})", R"("z")"}));
+    EXPECT_EQ(v.toValue(), tree);
+  }
   EXPECT_EQ(member(nullptr, "s"), nullptr);
-  Value array = Value::array();
-  EXPECT_EQ(member(array, "s"), nullptr);
+  EXPECT_EQ(member(Value::array(), "s"), nullptr);
 }
 
 // The JSONTestSuite corpus: y_ must parse, n_ must be rejected (the fuzz replay of the same corpus

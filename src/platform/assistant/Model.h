@@ -158,33 +158,34 @@ struct FieldJsonWriter {
 
 /// Reads fields from a dictionary; a value of the wrong type leaves its field absent.
 struct FieldReader {
-  const Value& in;
+  platform::JsonView in;
 
-  void operator()(const char* key, std::optional<std::string>& v) const { v = platform::stringValue(platform::member(in, key)); }
+  void operator()(const char* key, std::optional<std::string>& v) const { v = platform::stringValue(in.member(key)); }
   void operator()(const char* key, std::optional<double>& v) const {
-    auto n = platform::numberValue(platform::member(in, key));
+    auto n = platform::numberValue(in.member(key));
     v = (n && std::isfinite(*n)) ? n : std::nullopt;
   }
-  void operator()(const char* key, std::optional<bool>& v) const { v = platform::boolValue(platform::member(in, key)); }
+  void operator()(const char* key, std::optional<bool>& v) const { v = platform::boolValue(in.member(key)); }
   void operator()(const char* key, std::optional<std::int64_t>& v) const {
-    const Value* m = platform::member(in, key);
-    v = (m && m->is_number()) ? std::optional<std::int64_t>(platform::integerValue(m)) : std::nullopt;
+    const platform::JsonView m = in.member(key);
+    v = m.isNumber() ? std::optional<std::int64_t>(platform::integerValue(m)) : std::nullopt;
   }
   template <class T>
   void operator()(const char* key, std::shared_ptr<T>& v) const {
-    const Value* m = platform::member(in, key);
-    v = (m && m->is_object()) ? T::fromDictionary(*m) : nullptr;
+    const platform::JsonView m = in.member(key);
+    v = m.isObject() ? T::fromDictionary(m) : nullptr;
   }
   template <class T>
   void operator()(const char* key, AXArray<T>& v) const {
-    const Value* m = platform::member(in, key);
-    if (!m || !m->is_array()) {
+    const platform::JsonView m = in.member(key);
+    if (!m.isArray()) {
       v.reset();
       return;
     }
     v.emplace();
-    for (const auto& item : *m) {
-      if (item.is_object()) v->push_back(T::fromDictionary(item));
+    v->reserve(m.size());
+    for (const auto& item : m) {
+      if (item.value.isObject()) v->push_back(T::fromDictionary(item.value));
     }
   }
 };
@@ -220,16 +221,20 @@ class AXRecord : public AXObject {
     out += '}';
   }
 
-  /// Fills `into` from a dictionary of this record's layout.
-  static void readFields(Derived& into, const Value& dictionary) {
+  /// Fills `into` from a dictionary of this record's layout (a tree or a parsed document).
+  static void readFields(Derived& into, platform::JsonView dictionary) {
     detail::FieldReader reader{dictionary};
     Derived::fields(into, reader);
   }
+  static void readFields(Derived& into, const Value& dictionary) { readFields(into, platform::JsonView(&dictionary)); }
 
-  [[nodiscard]] static std::shared_ptr<Derived> fromDictionary(const Value& dictionary) {
+  [[nodiscard]] static std::shared_ptr<Derived> fromDictionary(platform::JsonView dictionary) {
     auto record = std::make_shared<Derived>();
     readFields(*record, dictionary);
     return record;
+  }
+  [[nodiscard]] static std::shared_ptr<Derived> fromDictionary(const Value& dictionary) {
+    return fromDictionary(platform::JsonView(&dictionary));
   }
 };
 

@@ -14,6 +14,9 @@ FormatArg::FormatArg(const Value& value)
 FormatArg::FormatArg(const Value* value)
     : v_(value == nullptr ? std::string("(null)") : (value->is_string() ? value->get<std::string>() : toJson(*value))) {}
 
+FormatArg::FormatArg(JsonView value)
+    : v_(!value ? std::string("(null)") : value.isString() ? std::string(*value.string()) : toJson(value.toValue())) {}
+
 std::string FormatArg::text() const {
   if (const auto* s = std::get_if<std::string>(&v_)) return *s;
   if (const auto* i = std::get_if<std::int64_t>(&v_)) return std::to_string(*i);

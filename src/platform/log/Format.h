@@ -35,6 +35,7 @@ class FormatArg {
   FormatArg(const std::optional<double>& d) : v_(d ? Variant(*d) : Variant(std::string("(null)"))) {}
   FormatArg(const Value& value);
   FormatArg(const Value* value);
+  FormatArg(JsonView value);
   FormatArg(const Object& object) : v_(object.description()) {}
   template <class T>
     requires std::derived_from<T, Object>

@@ -23,7 +23,7 @@ std::string_view describeTransferError(KYTransferError error) noexcept {
 }
 
 KYJSONCommand::~KYJSONCommand() {
-  if (parsedResponse_) releaseValue(*parsedResponse_);
+  if (responseTree_) releaseValue(*responseTree_);
 }
 
 std::string KYJSONCommand::path() const { return "/"; }
@@ -37,16 +37,22 @@ std::optional<std::string> KYJSONCommand::url() const {
   return scheme_ + "://" + *host_ + path();
 }
 
+JsonView KYJSONCommand::jsonResponse() { return parsedResponse_ ? parsedResponse_->root() : JsonView(); }
+
 const Value* KYJSONCommand::jsonResponseDictionary() {
-  return (parsedResponse_ && parsedResponse_->is_object()) ? &*parsedResponse_ : nullptr;
+  const JsonView response = jsonResponse();
+  if (!response) return nullptr;
+  if (!responseTree_) responseTree_ = response.toValue();
+  return &*responseTree_;
 }
 
 double KYJSONCommand::minCallbackInterval() { return 0.0; }
 
 void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& limits) {
-  if (parsedResponse_) releaseValue(*parsedResponse_);
-  auto parsed = parseJson(body, limits);
-  if (parsed && parsed->is_object()) parsedResponse_ = std::move(parsed);
+  if (responseTree_) releaseValue(*responseTree_);
+  responseTree_.reset();
+  auto parsed = parseJsonDocument(body, limits);
+  if (parsed && parsed->root().isObject()) parsedResponse_ = std::make_shared<const JsonDocument>(std::move(*parsed));
   else parsedResponse_.reset();
 }
 

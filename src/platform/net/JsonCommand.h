@@ -71,8 +71,13 @@ class KYJSONCommand : public Object {
   [[nodiscard]] std::optional<std::string> url() const;
 
   // ---- Outcome ----
-  /// The response body parsed as a JSON object, or nullptr (no body, not JSON, not an object).
-  [[nodiscard]] virtual const Value* jsonResponseDictionary();
+  /// The response body parsed as a JSON object, read in place; absent when there is no body, it is
+  /// not JSON, or not an object. Valid until the next `setResponseBody` or the command's end.
+  [[nodiscard]] virtual JsonView jsonResponse();
+  /// The same as a tree, made on first use, for callers that need a dictionary; nullptr when absent.
+  [[nodiscard]] const Value* jsonResponseDictionary();
+  /// The document `jsonResponse` reads, for results that keep the response beyond the command.
+  [[nodiscard]] const std::shared_ptr<const JsonDocument>& responseDocument() const noexcept { return parsedResponse_; }
   /// The minimum interval, in seconds, the server asked for between calls; 0 unless overridden.
   [[nodiscard]] virtual double minCallbackInterval();
   /// The exchange completed with an HTTP 2xx status.
@@ -129,7 +134,8 @@ class KYJSONCommand : public Object {
   KYTransferError error_ = KYTransferError::NotSent;
   std::string errorDetail_;
   std::optional<HTTPResponse> response_;
-  std::optional<Value> parsedResponse_;
+  std::shared_ptr<const JsonDocument> parsedResponse_;
+  std::optional<Value> responseTree_;
   bool redirected_ = false;
   std::optional<std::string> originalHost_;
   std::optional<std::string> redirectedHost_;

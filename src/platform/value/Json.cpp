@@ -4,7 +4,11 @@
 
 #include <simdjson.h>
 
+#include <algorithm>
+#include <atomic>
 #include <charconv>
+#include <cstring>
+#include <limits>
 #include <cmath>
 #include <deque>
 #include <memory>
@@ -147,89 +151,148 @@ class Builder {
   std::deque<Members> members_;  // by depth; a deque, so that growing it moves none
 };
 
-/// Makes the Value of a document that simdjson has read, by the rules of Builder: the nesting depth
-/// bounded, non-finite numbers refused, of duplicate keys the last value at the position of the
-/// first. Each container is made at its final size, so nothing it holds is moved again; keys are
-/// compared and indexed as views into simdjson's document, which lives as long as this does.
-class Converter {
- public:
-  explicit Converter(std::size_t maxDepth) : maxDepth_(maxDepth) {}
+// A document read by simdjson is kept as simdjson's tape: one 64-bit word per value, its type in
+// the top byte; an array or object word holds the index just past its closing word; a number is
+// followed by a word holding its bits; a string word holds the offset of its text in the string
+// buffer, where a 32-bit length precedes it.
 
-  /// False when the document breaks a rule; `out` is then unspecified.
-  bool convert(simdjson::dom::element element, Value& out, std::size_t depth = 0) {
-    using simdjson::dom::element_type;
-    switch (element.type()) {
-      case element_type::ARRAY: {
-        if (depth >= maxDepth_) return false;
-        const simdjson::dom::array array = element.get_array().value_unsafe();
-        out = Value::array();
-        auto& items = out.get_ref<Value::array_t&>();
-        items.reserve(array.size());
-        for (const simdjson::dom::element item : array) {
-          if (!convert(item, items.emplace_back(), depth + 1)) return false;
-        }
-        return true;
-      }
-      case element_type::OBJECT: {
-        if (depth >= maxDepth_) return false;
-        const simdjson::dom::object object = element.get_object().value_unsafe();
-        out = Value::object();
-        auto& members = static_cast<Value::object_t::Container&>(out.get_ref<Value::object_t&>());
-        const std::size_t size = object.size();
-        members.reserve(size);
-        std::unordered_map<std::string_view, std::size_t> index;  // for large objects only
-        if (size > kIndexThreshold) index.reserve(size);
-        for (const simdjson::dom::key_value_pair member : object) {
-          std::size_t at = members.size();
-          if (size > kIndexThreshold) {
-            const auto [it, added] = index.emplace(member.key, at);
-            if (!added) at = it->second;
-          } else {
-            for (std::size_t i = 0; i < members.size(); ++i) {
-              if (members[i].first == member.key) {
-                at = i;
-                break;
-              }
+using Document = simdjson::dom::document;
+
+const Document& documentOf(const void* document) noexcept { return *static_cast<const Document*>(document); }
+
+char typeAt(const Document& document, std::size_t index) noexcept {
+  return static_cast<char>(document.tape[index] >> 56);
+}
+
+/// The index just past the value at `index`.
+inline std::size_t after(const Document& document, std::size_t index) noexcept {
+  const std::uint64_t word = document.tape[index];
+  switch (static_cast<char>(word >> 56)) {
+    case '[':
+    case '{': return static_cast<std::uint32_t>(word);
+    case 'l':
+    case 'u':
+    case 'd': return index + 2;
+    default: return index + 1;
+  }
+}
+
+/// The index of the closing word of the array or object at `index`.
+std::size_t closing(const Document& document, std::size_t index) noexcept {
+  return static_cast<std::uint32_t>(document.tape[index]) - 1;
+}
+
+/// The number of items or members of the container at `index`.
+std::size_t countAt(const Document& document, std::size_t index) noexcept {
+  const auto count = static_cast<std::size_t>((document.tape[index] >> 32) & simdjson::internal::JSON_COUNT_MASK);
+  if (count < simdjson::internal::JSON_COUNT_MASK) return count;
+  // The tape's count saturates: walk.
+  const bool object = typeAt(document, index) == '{';
+  std::size_t walked = 0;
+  const std::size_t end = closing(document, index);
+  for (std::size_t i = index + 1; i < end; i = after(document, object ? i + 1 : i)) ++walked;
+  return walked;
+}
+
+std::string_view stringAt(const Document& document, std::size_t index) noexcept {
+  const std::size_t offset = document.tape[index] & simdjson::internal::JSON_VALUE_MASK;
+  std::uint32_t length = 0;
+  std::memcpy(&length, &document.string_buf[offset], sizeof length);
+  return {reinterpret_cast<const char*>(&document.string_buf[offset + sizeof length]), length};
+}
+
+template <class T>
+T payloadAt(const Document& document, std::size_t index) noexcept {
+  T value;
+  std::memcpy(&value, &document.tape[index + 1], sizeof value);
+  return value;
+}
+
+/// Whether the document keeps the rules that simdjson does not check: the nesting depth bounded,
+/// every number finite.
+bool keepsLimits(const Document& document, std::size_t maxDepth) noexcept {
+  const std::size_t end = static_cast<std::size_t>(document.tape[0] & simdjson::internal::JSON_VALUE_MASK);
+  std::size_t depth = 0;
+  for (std::size_t i = 1; i < end;) {
+    switch (typeAt(document, i)) {
+      case '[':
+      case '{':
+        if (++depth > maxDepth) return false;
+        ++i;
+        break;
+      case ']':
+      case '}':
+        --depth;
+        ++i;
+        break;
+      case 'd':
+        if (!std::isfinite(payloadAt<double>(document, i))) return false;
+        i += 2;
+        break;
+      case 'l':
+      case 'u': i += 2; break;
+      default: ++i;
+    }
+  }
+  return true;
+}
+
+/// Makes the Value of the document's value at `index`: of duplicate keys the last value at the
+/// position of the first. Each container is made at its final size, so nothing it holds is moved
+/// again; keys are compared and indexed as views into the document.
+void convert(const Document& document, std::size_t index, Value& out) {
+  switch (typeAt(document, index)) {
+    case '[': {
+      out = Value::array();
+      auto& items = out.get_ref<Value::array_t&>();
+      items.reserve(countAt(document, index));
+      const std::size_t end = closing(document, index);
+      for (std::size_t i = index + 1; i < end; i = after(document, i)) convert(document, i, items.emplace_back());
+      return;
+    }
+    case '{': {
+      out = Value::object();
+      auto& members = static_cast<Value::object_t::Container&>(out.get_ref<Value::object_t&>());
+      const std::size_t size = countAt(document, index);
+      members.reserve(size);
+      std::unordered_map<std::string_view, std::size_t> keys;  // for large objects only
+      if (size > kIndexThreshold) keys.reserve(size);
+      const std::size_t end = closing(document, index);
+      for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) {
+        const std::string_view key = stringAt(document, i);
+        std::size_t at = members.size();
+        if (size > kIndexThreshold) {
+          const auto [it, added] = keys.emplace(key, at);
+          if (!added) at = it->second;
+        } else {
+          for (std::size_t m = 0; m < members.size(); ++m) {
+            if (members[m].first == key) {
+              at = m;
+              break;
             }
           }
-          if (at == members.size()) members.emplace_back(std::string(member.key), Value());
-          Value& slot = members[at].second;
-          slot = Value();  // a repeated key's value is replaced as a whole
-          if (!convert(member.value, slot, depth + 1)) return false;
         }
-        return true;
+        if (at == members.size()) members.emplace_back(std::string(key), Value());
+        Value& slot = members[at].second;
+        slot = Value();  // a repeated key's value is replaced as a whole
+        convert(document, i + 1, slot);
       }
-      case element_type::STRING:
-        out = Value(std::string(element.get_string().value_unsafe()));
-        return true;
-      case element_type::INT64: {
-        // nlohmann keeps every non-negative integer unsigned.
-        const std::int64_t v = element.get_int64().value_unsafe();
-        out = v >= 0 ? Value(static_cast<Value::number_unsigned_t>(v)) : Value(static_cast<Value::number_integer_t>(v));
-        return true;
-      }
-      case element_type::UINT64:
-        out = Value(static_cast<Value::number_unsigned_t>(element.get_uint64().value_unsafe()));
-        return true;
-      case element_type::DOUBLE: {
-        const double v = element.get_double().value_unsafe();
-        if (!std::isfinite(v)) return false;
-        out = Value(static_cast<Value::number_float_t>(v));
-        return true;
-      }
-      case element_type::BOOL:
-        out = Value(element.get_bool().value_unsafe());
-        return true;
-      case element_type::NULL_VALUE:
-        out = Value(nullptr);
-        return true;
+      return;
     }
-    return false;
+    case '"': out = Value(std::string(stringAt(document, index))); return;
+    case 'l': {
+      // nlohmann keeps every non-negative integer unsigned.
+      const auto v = payloadAt<std::int64_t>(document, index);
+      out = v >= 0 ? Value(static_cast<Value::number_unsigned_t>(v)) : Value(static_cast<Value::number_integer_t>(v));
+      return;
+    }
+    case 'u': out = Value(static_cast<Value::number_unsigned_t>(payloadAt<std::uint64_t>(document, index))); return;
+    case 'd': out = Value(static_cast<Value::number_float_t>(payloadAt<double>(document, index))); return;
+    case 't': out = Value(true); return;
+    case 'f': out = Value(false); return;
+    default: out = Value(nullptr); return;
   }
-
- private:
-  std::size_t maxDepth_;
-};
+}
 
 /// Texts up to this size are read by a kept parser, which keeps its buffers (about fourteen bytes
 /// per byte of text); a larger one gets a parser of its own, so that one large answer does not
@@ -257,37 +320,34 @@ class ParserPool {
     if (idle_.size() < kKept) idle_.push_back(std::move(parser));  // reserved: never throws
   }
   ParserPool() { idle_.reserve(kKept); }
+  ParserPool(const ParserPool&) = delete;
+  ParserPool& operator=(const ParserPool&) = delete;
+  ~ParserPool() { gone_.store(true); }
+  /// A document may outlive the pool at the process's (or the plug-in's) end: its parser is then
+  /// simply freed. The flag needs no destruction, so it can be read after the pool's.
+  [[nodiscard]] static bool gone() noexcept { return gone_.load(); }
 
  private:
+  static inline std::atomic<bool> gone_{false};
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
   std::mutex mutex_;
   std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
 };
 
-/// The text read by simdjson, several times faster than nlohmann's own reader; nothing when
-/// simdjson refuses it, and then nlohmann's reader decides.
-std::optional<Value> parseFast(std::string_view text, const JsonLimits& limits) {
-  if (text.empty()) return std::nullopt;  // simdjson would copy from a null pointer
-  // Surrogate escapes are left to nlohmann's reader, which refuses every unpaired one.
-  for (std::size_t at = text.find("\\u"); at != std::string_view::npos; at = text.find("\\u", at + 2)) {
-    if (at + 2 < text.size() && (text[at + 2] == 'd' || text[at + 2] == 'D')) return std::nullopt;
-  }
+ParserPool& parserPool() {
   static ParserPool pool;
-  const bool keep = text.size() <= kKeptParserBytes;
-  auto parser = keep ? pool.take() : std::make_unique<simdjson::dom::parser>();
-  struct GiveBack {
-    ParserPool& pool;
-    std::unique_ptr<simdjson::dom::parser>& parser;
-    bool keep;
-    ~GiveBack() {
-      if (keep) pool.giveBack(std::move(parser));
-    }
-  } giveBack{pool, parser, keep};
-  simdjson::dom::element root;
-  if (parser->parse(text.data(), text.size()).get(root) != simdjson::SUCCESS) return std::nullopt;
-  Value value;
-  if (!Converter(limits.maxDepth).convert(root, value)) return std::nullopt;
-  return value;
+  return pool;
+}
+
+/// Whether simdjson may read the text; else nlohmann's reader decides. Surrogate escapes are left
+/// to nlohmann's reader, which refuses every unpaired one; simdjson would copy from the null
+/// pointer of an empty text.
+bool simdjsonMayRead(std::string_view text) noexcept {
+  if (text.empty()) return false;
+  for (std::size_t at = text.find("\\u"); at != std::string_view::npos; at = text.find("\\u", at + 2)) {
+    if (at + 2 < text.size() && (text[at + 2] == 'd' || text[at + 2] == 'D')) return false;
+  }
+  return true;
 }
 
 }  // namespace
@@ -365,21 +425,315 @@ void appendJsonNumber(std::string& out, std::int64_t value) {
   out.append(buffer, static_cast<std::size_t>(result.ptr - buffer));
 }
 
-std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept {
+struct JsonDocument::Storage {
+  std::unique_ptr<simdjson::dom::parser> parser;  // holds the document simdjson read
+  bool kept = false;                              // the parser goes back to the pool
+  Value value;                                    // the tree of a text that simdjson did not read
+  Storage() = default;
+  Storage(const Storage&) = delete;
+  Storage& operator=(const Storage&) = delete;
+  ~Storage() {
+    releaseValue(value);
+    if (kept && parser && !ParserPool::gone()) parserPool().giveBack(std::move(parser));
+  }
+};
+
+JsonDocument::JsonDocument() noexcept = default;
+JsonDocument::~JsonDocument() = default;
+JsonDocument::JsonDocument(JsonDocument&& other) noexcept = default;
+JsonDocument& JsonDocument::operator=(JsonDocument&& other) noexcept = default;
+
+std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept {
   if (text.size() > limits.maxBytes) return std::nullopt;
-  // The lexer takes a NUL byte for the end of the input and would ignore whatever follows it; a raw
-  // NUL is valid nowhere in JSON, so such a text is refused outright.
+  // nlohmann's lexer takes a NUL byte for the end of the input and would ignore whatever follows
+  // it; a raw NUL is valid nowhere in JSON, so such a text is refused outright.
   if (text.find('\0') != std::string_view::npos) return std::nullopt;
   try {
-    if (auto fast = parseFast(text, limits)) return fast;
+    JsonDocument document;
+    document.storage_ = std::make_unique<JsonDocument::Storage>();
+    JsonDocument::Storage& storage = *document.storage_;
+    if (simdjsonMayRead(text)) {
+      // simdjson reads several times faster than nlohmann's reader; what it refuses, nlohmann's decides.
+      storage.kept = text.size() <= kKeptParserBytes;
+      storage.parser = storage.kept ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
+      simdjson::dom::element root;
+      if (storage.parser->parse(text.data(), text.size()).get(root) == simdjson::SUCCESS) {
+        if (!keepsLimits(storage.parser->doc, limits.maxDepth)) return std::nullopt;
+        document.root_ = JsonView::inDocument(&storage.parser->doc, 1);  // the root word comes first
+        return document;
+      }
+    }
     Builder builder(limits.maxDepth);
     const bool ok = Value::sax_parse(text.begin(), text.end(), &builder, Value::input_format_t::json,
                                      /*strict=*/true, /*ignore_comments=*/false);
     if (!ok) return std::nullopt;
-    return builder.take();
+    storage.value = builder.take();
+    document.root_ = JsonView(&storage.value);
+    return document;
   } catch (...) {
     return std::nullopt;
   }
+}
+
+std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept {
+  try {
+    auto document = parseJsonDocument(text, limits);
+    if (!document) return std::nullopt;
+    return document->root().toValue();
+  } catch (...) {
+    return std::nullopt;
+  }
+}
+
+// ---- JsonView ----
+
+namespace {
+/// A number as a value holds it.
+struct Number {
+  enum class Kind : std::uint8_t { None, Signed, Unsigned, Real } kind = Kind::None;
+  std::int64_t i = 0;
+  std::uint64_t u = 0;
+  double d = 0.0;
+};
+}  // namespace
+
+struct JsonViewAccess {
+  static Number number(const JsonView& view) noexcept {
+    Number n;
+    if (view.kind_ == JsonView::Kind::Tree) {
+      const Value& v = view.tree();
+      if (v.is_number_unsigned()) {
+        n.kind = Number::Kind::Unsigned;
+        n.u = v.get<std::uint64_t>();
+      } else if (v.is_number_integer()) {
+        n.kind = Number::Kind::Signed;
+        n.i = v.get<std::int64_t>();
+      } else if (v.is_number_float()) {
+        n.kind = Number::Kind::Real;
+        n.d = v.get<double>();
+      }
+    } else if (view.kind_ == JsonView::Kind::Document) {
+      const Document& document = documentOf(view.ptr_);
+      switch (typeAt(document, view.index_)) {
+        case 'l':
+          n.kind = Number::Kind::Signed;
+          n.i = payloadAt<std::int64_t>(document, view.index_);
+          break;
+        case 'u':
+          n.kind = Number::Kind::Unsigned;
+          n.u = payloadAt<std::uint64_t>(document, view.index_);
+          break;
+        case 'd':
+          n.kind = Number::Kind::Real;
+          n.d = payloadAt<double>(document, view.index_);
+          break;
+        default: break;
+      }
+    }
+    return n;
+  }
+
+  static char type(const JsonView& view) noexcept {
+    if (view.kind_ == JsonView::Kind::Document) return typeAt(documentOf(view.ptr_), view.index_);
+    if (view.kind_ == JsonView::Kind::Absent) return '\0';
+    switch (view.tree().type()) {
+      case Value::value_t::null: return 'n';
+      case Value::value_t::boolean: return view.tree().get<bool>() ? 't' : 'f';
+      case Value::value_t::string: return '"';
+      case Value::value_t::array: return '[';
+      case Value::value_t::object: return '{';
+      case Value::value_t::number_float: return 'd';
+      case Value::value_t::number_unsigned: return 'u';
+      case Value::value_t::number_integer: return 'l';
+      default: return '\0';
+    }
+  }
+
+  static const Document& document(const JsonView& view) noexcept { return documentOf(view.ptr_); }
+  static std::size_t index(const JsonView& view) noexcept { return view.index_; }
+  static bool inDocument(const JsonView& view) noexcept { return view.kind_ == JsonView::Kind::Document; }
+};
+
+namespace {
+char typeOf(const JsonView& view) noexcept { return JsonViewAccess::type(view); }
+}  // namespace
+
+bool JsonView::isNull() const noexcept { return typeOf(*this) == 'n'; }
+bool JsonView::isBool() const noexcept {
+  const char t = typeOf(*this);
+  return t == 't' || t == 'f';
+}
+bool JsonView::isNumber() const noexcept {
+  const char t = typeOf(*this);
+  return t == 'l' || t == 'u' || t == 'd';
+}
+bool JsonView::isString() const noexcept { return typeOf(*this) == '"'; }
+bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
+bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
+
+JsonView JsonView::member(std::string_view key) const noexcept {
+  if (kind_ == Kind::Tree) return platform::member(&tree(), key);
+  if (kind_ != Kind::Document) return {};
+  const Document& document = documentOf(ptr_);
+  const std::uint64_t* tape = document.tape.get();
+  if (static_cast<char>(tape[index_] >> 56) != '{') return {};
+  const std::uint8_t* strings = document.string_buf.get();
+  JsonView found;
+  const std::size_t end = closing(document, index_);
+  for (std::size_t i = index_ + 1; i < end;) {
+    const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
+    std::uint32_t length = 0;
+    std::memcpy(&length, name, sizeof length);
+    if (length == key.size() && std::memcmp(name + sizeof length, key.data(), length) == 0) {
+      found = inDocument(ptr_, i + 1);  // the last one wins
+    }
+    i = after(document, i + 1);
+  }
+  return found;
+}
+
+void JsonView::members(std::span<const std::string_view> keys, std::span<JsonView> found) const noexcept {
+  const std::size_t count = std::min(keys.size(), found.size());
+  for (std::size_t k = 0; k < count; ++k) found[k] = JsonView();
+  if (kind_ == Kind::Tree) {
+    for (std::size_t k = 0; k < count; ++k) found[k] = member(keys[k]);
+    return;
+  }
+  if (kind_ != Kind::Document) return;
+  const Document& document = documentOf(ptr_);
+  const std::uint64_t* tape = document.tape.get();
+  if (static_cast<char>(tape[index_] >> 56) != '{') return;
+  const std::uint8_t* strings = document.string_buf.get();
+  const std::size_t end = closing(document, index_);
+  for (std::size_t i = index_ + 1; i < end; i = after(document, i + 1)) {
+    const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
+    std::uint32_t length = 0;
+    std::memcpy(&length, name, sizeof length);
+    for (std::size_t k = 0; k < count; ++k) {
+      if (length == keys[k].size() && std::memcmp(name + sizeof length, keys[k].data(), length) == 0) {
+        found[k] = inDocument(ptr_, i + 1);  // the last one wins
+        break;
+      }
+    }
+  }
+}
+
+JsonView JsonView::memberNotNull(std::string_view key) const noexcept {
+  JsonView found = member(key);
+  return found.isNull() ? JsonView() : found;
+}
+
+std::optional<std::string_view> JsonView::string() const noexcept {
+  if (kind_ == Kind::Tree) {
+    if (!tree().is_string()) return std::nullopt;
+    return std::string_view(tree().get_ref<const std::string&>());
+  }
+  if (kind_ == Kind::Document && typeAt(documentOf(ptr_), index_) == '"') return stringAt(documentOf(ptr_), index_);
+  return std::nullopt;
+}
+
+std::size_t JsonView::size() const noexcept {
+  if (kind_ == Kind::Tree) return tree().is_structured() ? tree().size() : 0;
+  if (kind_ == Kind::Document && (isArray() || isObject())) return countAt(documentOf(ptr_), index_);
+  return 0;
+}
+
+Value JsonView::toValue() const {
+  if (kind_ == Kind::Tree) return tree();
+  Value out;
+  if (kind_ == Kind::Document) convert(documentOf(ptr_), index_, out);
+  return out;
+}
+
+JsonView::Iterator JsonView::begin() const noexcept {
+  Iterator it;
+  it.container_ = ptr_;
+  it.document_ = kind_ == Kind::Document;
+  it.object_ = isObject();
+  if (it.document_ && (it.object_ || isArray())) it.at_ = index_ + 1;
+  return it;
+}
+
+JsonView::Iterator JsonView::end() const noexcept {
+  Iterator it = begin();
+  if (kind_ == Kind::Tree && tree().is_structured()) it.at_ = tree().size();
+  if (kind_ == Kind::Document && (it.object_ || isArray())) it.at_ = closing(documentOf(ptr_), index_);
+  return it;
+}
+
+JsonView::Entry JsonView::Iterator::operator*() const noexcept {
+  if (!document_) {
+    const Value& v = *static_cast<const Value*>(container_);
+    if (!object_) return {{}, &v.get_ref<const Value::array_t&>()[at_]};
+    const auto& members = static_cast<const Value::object_t::Container&>(v.get_ref<const Value::object_t&>());
+    return {members[at_].first, &members[at_].second};
+  }
+  if (!object_) return {{}, inDocument(container_, at_)};
+  return {stringAt(documentOf(container_), at_), inDocument(container_, at_ + 1)};
+}
+
+JsonView::Iterator& JsonView::Iterator::operator++() noexcept {
+  if (!document_) {
+    ++at_;
+  } else {
+    at_ = after(documentOf(container_), object_ ? at_ + 1 : at_);
+  }
+  return *this;
+}
+
+// ---- Readers ----
+
+std::optional<std::string> stringValue(JsonView value) {
+  const auto text = value.string();
+  if (!text) return std::nullopt;
+  return std::string(*text);
+}
+
+std::optional<double> numberValue(JsonView value) noexcept {
+  const Number n = JsonViewAccess::number(value);
+  switch (n.kind) {
+    case Number::Kind::Signed: return static_cast<double>(n.i);
+    case Number::Kind::Unsigned: return static_cast<double>(n.u);
+    case Number::Kind::Real: return n.d;
+    case Number::Kind::None: break;
+  }
+  return std::nullopt;
+}
+
+std::optional<bool> boolValue(JsonView value) noexcept {
+  const char t = typeOf(value);
+  if (t == 't') return true;
+  if (t == 'f') return false;
+  if (const auto n = numberValue(value)) return *n != 0.0;
+  return std::nullopt;
+}
+
+std::int64_t integerValue(JsonView value) noexcept {
+  const Number n = JsonViewAccess::number(value);
+  switch (n.kind) {
+    case Number::Kind::Signed: return n.i;
+    case Number::Kind::Unsigned:
+      return n.u > static_cast<std::uint64_t>(std::numeric_limits<std::int64_t>::max())
+                 ? std::numeric_limits<std::int64_t>::max()
+                 : static_cast<std::int64_t>(n.u);
+    case Number::Kind::Real:
+      if (std::isnan(n.d)) return 0;
+      if (n.d >= 9.2233720368547758e18) return std::numeric_limits<std::int64_t>::max();
+      if (n.d <= -9.2233720368547758e18) return std::numeric_limits<std::int64_t>::min();
+      return static_cast<std::int64_t>(n.d);
+    case Number::Kind::None: break;
+  }
+  const char t = typeOf(value);
+  if (t == 't') return 1;
+  if (t == 'f') return 0;
+  if (const auto text = value.string()) return leadingInteger64(*text);
+  return 0;
+}
+
+std::int32_t int32Value(JsonView value) noexcept {
+  if (const auto text = value.string()) return leadingInteger32(*text);
+  // Modular narrowing, as a number object's 32-bit accessor does.
+  return static_cast<std::int32_t>(static_cast<std::uint32_t>(static_cast<std::uint64_t>(integerValue(value))));
 }
 
 std::string toJson(const Value& value, int indent) noexcept {

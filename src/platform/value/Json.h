@@ -4,6 +4,7 @@
 
 #include <cstddef>
 #include <cstdint>
+#include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
@@ -20,6 +21,30 @@ struct JsonLimits {
 /// invalid UTF-8, or a number that does not fit a double. Never throws. Work is linear in the text.
 /// Of duplicate keys in one object the last value wins, at the position of the first.
 [[nodiscard]] std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits = {}) noexcept;
+
+/// A parsed JSON text, read through `root()` without building a tree. Views into it stay valid as
+/// long as the document lives; moving it keeps them valid.
+class JsonDocument {
+ public:
+  JsonDocument() noexcept;
+  ~JsonDocument();
+  JsonDocument(JsonDocument&& other) noexcept;
+  JsonDocument& operator=(JsonDocument&& other) noexcept;
+  JsonDocument(const JsonDocument&) = delete;
+  JsonDocument& operator=(const JsonDocument&) = delete;
+
+  /// The top-level value; absent for a default-made document.
+  [[nodiscard]] JsonView root() const noexcept { return root_; }
+
+ private:
+  friend std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept;
+  struct Storage;
+  std::unique_ptr<Storage> storage_;
+  JsonView root_;
+};
+
+/// Parses a JSON text by the rules of `parseJson` into a document.
+[[nodiscard]] std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits = {}) noexcept;
 
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
