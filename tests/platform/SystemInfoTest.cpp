@@ -98,6 +98,10 @@ TEST_F(SystemInfoTest, DeviceFacts) {
   EXPECT_FALSE(osReleaseField("EMPTY=\"\"\n", "EMPTY"));
   configDir->write("product_name", "  \n");
   EXPECT_FALSE(facts.productType());
+  configDir->write("product_name", std::string(256, 'p'));
+  EXPECT_EQ(facts.productType(), std::string(256, 'p'));
+  configDir->write("product_name", std::string(257, 'p'));  // longer than any product name: not read
+  EXPECT_FALSE(facts.productType());
   configDir->write("os-release", "VERSION_ID=12\n");
   EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead
   // An identifier exactly when the machine has an id (a bare chroot may have none).
