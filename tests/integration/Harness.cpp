@@ -61,11 +61,11 @@ std::vector<Json> Sim::requests() const {
   return out;
 }
 
-void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
-                    const Json& extraConfig) const {
+void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile, const Json& extraConfig,
+                    const char* personId, const char* token) const {
   writeFile(dir / "account.json",
-            Json{{"personId", kPersonId}, {"username", "ada@example.com"}, {"serviceHost", host}}.dump(), 0644);
-  writeFile(dir / "token", std::string(kToken) + "\n", 0600);
+            Json{{"personId", personId}, {"username", "ada@example.com"}, {"serviceHost", host}}.dump(), 0644);
+  writeFile(dir / "token", std::string(token) + "\n", 0600);
   Json config = {{"connectTimeoutMs", 5000}, {"totalTimeoutMs", 15000}};
   if (caFile) config["caFile"] = caFile->string();
   for (const auto& [k, v] : extraConfig.items()) config[k] = v;

@@ -51,7 +51,7 @@ struct Account {
   explicit Account(std::filesystem::path directory) : dir(std::move(directory)) {}
   /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
   void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
-             const Json& extraConfig = Json::object()) const;
+             const Json& extraConfig = Json::object(), const char* personId = kPersonId, const char* token = kToken) const;
   /// Adds a vCard file to the address book.
   void addCard(const std::string& fileName, const std::string& card) const;
   std::filesystem::path dir;
