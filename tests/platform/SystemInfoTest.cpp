@@ -14,10 +14,6 @@ class SystemInfoTest : public test::PlatformTest {
     PlatformTest::SetUp();
     ::unsetenv("KYN_APP_TOKEN");
   }
-  void TearDown() override {
-    ::unsetenv("KYN_APP_TOKEN");
-    PlatformTest::TearDown();
-  }
   LinuxSystemInfo info() const {
     return LinuxSystemInfo(LinuxSystemInfo::Paths{configDir->path() / "account.json", configDir->path() / "token",
                                                   configDir->path() / "product_name", configDir->path() / "os-release"});
