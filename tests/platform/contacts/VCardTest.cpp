@@ -198,7 +198,8 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
       "ORG:Acme\\; Sons;Research;Lab 2\r\n"
       "ADR;TYPE=HOME:PO 7;Apt 3;12 Elm St\\nBack door;Springfield;OR;97400;Testland\r\n"
       "ADR:;;;Lakeview;;;\r\n"
-      "ADR:;;;;;;\r\n"));
+      "ADR:;;;;;;\r\n"
+      "ADR:;;1 Main St;;;;;Extra;More\r\n"));
   EXPECT_EQ(c.familyName, "O;Neil");
   EXPECT_EQ(c.givenName, "Mary Ann");  // list items joined with a space
   EXPECT_EQ(c.middleName, "Jo,Beth");  // an escaped comma is no separator
@@ -208,9 +209,11 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
   EXPECT_EQ(c.urlAddresses, (Labeled{{std::nullopt, "http://example.com/a,b"}}));
   EXPECT_EQ(c.organizationName, "Acme; Sons");
   EXPECT_EQ(c.departmentName, "Research, Lab 2");
-  // Address components in label order; empty ones leave no blank lines; an empty address is none.
+  // Address components in label order; empty ones leave no blank lines; an empty address is none;
+  // components past the seventh join the country.
   EXPECT_EQ(c.postalAddresses, (Labeled{{"home", "PO 7\nApt 3\n12 Elm St\nBack door\nSpringfield, OR 97400\nTestland"},
-                                        {std::nullopt, "Lakeview"}}));
+                                        {std::nullopt, "Lakeview"},
+                                        {std::nullopt, "1 Main St\nExtra More"}}));
 }
 
 TEST(VCardProperties, EveryFieldOfAContact) {
