@@ -367,6 +367,7 @@ TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
   EXPECT_FALSE(parseOne(test::vcard("PHOTO;ENCODING=b:\r\nPHOTO:data:image/png;base64,\r\nPHOTO:data:nocomma\r\n")).imageData);
   // A data URI without a media type or base64 holds its bytes percent-encoded.
   EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO:data:,%01%02%03\r\n", "4.0")).imageData), kOther);
+  EXPECT_EQ(bytesOf(parseOne(test::vcard(std::string("PHOTO:data:;base64,") + kOtherBase64 + "\r\n", "4.0")).imageData), kOther);
 }
 
 TEST(VCardPictures, ATenMegabytePhotoOfEveryBase64LetterIsRead) {
