@@ -66,6 +66,7 @@ TEST_F(PreferencesStoreTest, ACorruptFileReadsAsEmptyAndIsReplacedOnTheNextWrite
     configDir->write("prefs/d.json", corrupt);
     FilePreferencesStore store(dir());
     EXPECT_FALSE(store.value("d", "k")) << corrupt;
+    EXPECT_FALSE(log->messages(LogLevel::Error).empty()) << corrupt;  // the user learns the file was lost
     store.setValue("d", "k", Value(1));
     ASSERT_TRUE(store.synchronize("d"));
     EXPECT_EQ(FilePreferencesStore(dir()).value("d", "k"), Value(1));
