@@ -68,10 +68,8 @@ TEST_F(ContactsUtilitiesTest, OfSeveralMatchesTheOneWithAPictureIsChosen) {
 }
 
 TEST(ContactKeys, EveryKeyNamesAPropertyTheStoreKnows) {
-  const auto keys = ContactsUtilities::contactKeys();
-  EXPECT_EQ(keys.size(), 30u);
   std::string unknown;
-  (void)platform::projectContact(platform::Contact{}, keys, &unknown);
+  (void)platform::projectContact(platform::Contact{}, ContactsUtilities::contactKeys(), &unknown);
   EXPECT_EQ(unknown, "");
 }
 

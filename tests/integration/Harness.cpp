@@ -42,7 +42,7 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   const std::string line = process_->readLine().value_or("");
   const auto colon = line.rfind(':');
   if (line.find("listening on https://") == std::string::npos || colon == std::string::npos) {
-    stop();
+    process_.reset();
     std::ifstream err(dir_ / "sim.err");
     std::stringstream text;
     text << err.rdbuf();
@@ -50,10 +50,6 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   }
   port_ = std::stoi(line.substr(colon + 1));
 }
-
-Sim::~Sim() { stop(); }
-
-void Sim::stop() { process_.reset(); }
 
 std::vector<Json> Sim::requests() const {
   std::vector<Json> out;
@@ -65,11 +61,11 @@ std::vector<Json> Sim::requests() const {
   return out;
 }
 
-void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
-                    const Json& extraConfig) const {
+void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile, const Json& extraConfig,
+                    const char* personId, const char* token) const {
   writeFile(dir / "account.json",
-            Json{{"personId", kPersonId}, {"username", "ada@example.com"}, {"serviceHost", host}}.dump(), 0644);
-  writeFile(dir / "token", std::string(kToken) + "\n", 0600);
+            Json{{"personId", personId}, {"username", "ada@example.com"}, {"serviceHost", host}}.dump(), 0644);
+  writeFile(dir / "token", std::string(token) + "\n", 0600);
   Json config = {{"connectTimeoutMs", 5000}, {"totalTimeoutMs", 15000}};
   if (caFile) config["caFile"] = caFile->string();
   for (const auto& [k, v] : extraConfig.items()) config[k] = v;
@@ -132,7 +128,7 @@ std::optional<Json> Plugin::performAndWait(const std::string& commandJson, std::
   return parse(box.wait(timeout));
 }
 
-std::string searchFor(const std::vector<std::string>& handles, bool withMyLocation) {
+std::string searchFor(const std::vector<std::string>& handles) {
   Json command = {{"class", "AXKynSearch"}, {"friends", Json::array()}};
   for (const auto& h : handles) {
     Json person = {{"class", "AXPerson"}};
@@ -140,7 +136,7 @@ std::string searchFor(const std::vector<std::string>& handles, bool withMyLocati
     else person["phones"] = Json::array({{{"number", h}}});
     command["friends"].push_back(person);
   }
-  if (withMyLocation) command["currentLocation"] = {{"latitude", 45.5231}, {"longitude", -122.6765}, {"accuracy", 30}};
+  command["currentLocation"] = {{"latitude", 45.5231}, {"longitude", -122.6765}, {"accuracy", 30}};
   return command.dump();
 }
 

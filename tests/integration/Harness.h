@@ -32,7 +32,6 @@ class Sim {
  public:
   /// Starts kyn-sim in `dir` with the data set and any further options; returns once it listens.
   Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std::string> extraArgs = {});
-  ~Sim();
   Sim(const Sim&) = delete;
   Sim& operator=(const Sim&) = delete;
 
@@ -40,8 +39,6 @@ class Sim {
   [[nodiscard]] std::filesystem::path caFile() const { return dir_ / "ca.pem"; }
   /// The request log, one object per request.
   [[nodiscard]] std::vector<Json> requests() const;
-  /// Stops the server now.
-  void stop();
 
  private:
   std::filesystem::path dir_;
@@ -54,7 +51,7 @@ struct Account {
   explicit Account(std::filesystem::path directory) : dir(std::move(directory)) {}
   /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
   void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
-             const Json& extraConfig = Json::object()) const;
+             const Json& extraConfig = Json::object(), const char* personId = kPersonId, const char* token = kToken) const;
   /// Adds a vCard file to the address book.
   void addCard(const std::string& fileName, const std::string& card) const;
   std::filesystem::path dir;
@@ -88,7 +85,6 @@ class Plugin {
   [[nodiscard]] std::vector<std::string> logLines() const;
   /// Every entry point of the plug-in.
   [[nodiscard]] host::PluginLibrary& library() noexcept { return library_; }
-  [[nodiscard]] void* symbol(const char* name) const { return library_.symbol(name); }
 
  private:
   static void onLog(int level, const char* message, void* context);
@@ -101,6 +97,6 @@ class Plugin {
 };
 
 /// A search command for friends given by e-mail address or phone number.
-[[nodiscard]] std::string searchFor(const std::vector<std::string>& handles, bool withMyLocation = true);
+[[nodiscard]] std::string searchFor(const std::vector<std::string>& handles);
 
 }  // namespace kyn::itest

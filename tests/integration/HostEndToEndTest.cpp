@@ -82,14 +82,8 @@ TEST(VisibilityEndToEnd, AFriendStopsSeeingTheLocationUntilItIsShownAgain) {
   Account(configDir.path()).write("localhost:" + std::to_string(sim->port()), sim->caFile());
   const std::string sam = configDir.path().string();
   const test::TempDir adaDir;
-  host::SpawnOptions token;
-  token.input = std::string(kAdaToken) + "\n";
-  ASSERT_EQ(runProgram({KYN_CLI_PATH, "--config", adaDir.path().string(), "account", "login", "--person-id", kAdaPerson,
-                        "--username", "ada@example.com", "--host", "localhost:" + std::to_string(sim->port())},
-                       token)
-                .status,
-            0);
-  adaDir.write("config.json", Json{{"caFile", sim->caFile().string()}}.dump(), 0644);
+  Account(adaDir.path())
+      .write("localhost:" + std::to_string(sim->port()), sim->caFile(), Json::object(), kAdaPerson, kAdaToken);
   // Where Ada sees Sam: his latitude, or nothing while he hides.
   auto samSeenByAda = [&]() -> Json {
     const auto seen = runProgram({KYN_CLI_PATH, "--config", adaDir.path().string(), "--json", "search", "--friend",

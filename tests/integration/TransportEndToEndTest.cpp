@@ -8,10 +8,6 @@
 
 #include <gtest/gtest.h>
 
-#include <netinet/in.h>
-#include <sys/socket.h>
-#include <unistd.h>
-
 #include <atomic>
 #include <fstream>
 #include <thread>
@@ -25,22 +21,9 @@ using namespace std::chrono_literals;
 constexpr const char* kPath = "/kytrservice/friends/va/getlocations";
 const Json kNoFriends = Json::parse(R"({"friends": {}})");
 
-/// A loopback port on which nothing listens: bound once to learn a free number, then closed.
-int closedPort() {
-  const int fd = socket(AF_INET, SOCK_STREAM, 0);
-  sockaddr_in address{};
-  address.sin_family = AF_INET;
-  address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-  socklen_t length = sizeof address;
-  if (fd < 0 || bind(fd, reinterpret_cast<sockaddr*>(&address), sizeof address) != 0 ||
-      getsockname(fd, reinterpret_cast<sockaddr*>(&address), &length) != 0) {
-    throw std::runtime_error("no free port");
-  }
-  close(fd);
-  return ntohs(address.sin_port);
-}
-
 std::string localhost(int port) { return "localhost:" + std::to_string(port); }
+// A privileged port on which nothing listens: connections to it are refused.
+const std::string kNothingListens = localhost(1);
 
 /// A get-locations request with the test account's credentials, for the transport alone.
 class Probe final : public platform::KYJSONCommand {
@@ -112,7 +95,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
   const std::vector<Case> cases = {
       {.name = "answered", .expected = KYTransferError::None, .http = 200},
       {.name = "no host", .expected = KYTransferError::NoHost, .host = ""},
-      {.name = "nothing listens", .expected = KYTransferError::Refused, .host = localhost(closedPort())},
+      {.name = "nothing listens", .expected = KYTransferError::Refused, .host = kNothingListens},
       // 0 ms would be no limit at all to curl: the slow answer would come after 20 s.
       {.name = "a limit of 0 ms", .simArgs = {"--fault", "slow:20000"}, .expected = KYTransferError::TimedOut,
        .totalTimeout = 0ms},
@@ -161,7 +144,7 @@ TEST(TransportEndToEnd, ARedirectCountsOnlyWhenTheNewHostAnswered) {
       {.name = "to a host that answers", .simArgs = {"--fault", "redirect:" + toTarget},
        .expected = KYTransferError::None, .counts = true},
       {.name = "to a closed port",
-       .simArgs = {"--fault", "redirect:https://" + localhost(closedPort()) + kPath},
+       .simArgs = {"--fault", "redirect:https://" + kNothingListens + kPath},
        .expected = KYTransferError::Refused},
       {.name = "to plain http", .simArgs = {"--fault", "redirect:http://" + localhost(target.port()) + kPath},
        .expected = KYTransferError::RedirectRefused},
@@ -223,7 +206,7 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
     box->replied = true;
     box->changed.notify_all();
   };
-  for (const std::string& host : {std::string(), localhost(closedPort())}) {
+  for (const std::string& host : {std::string(), kNothingListens}) {
     test::TempDir configDir;
     Account(configDir.path()).write(host, std::nullopt);
     Plugin plugin;
@@ -245,7 +228,7 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
 // network thread (nothing listens at the account's host).
 TEST(TransportEndToEnd, SeveralHostThreadsPerformAtOnce) {
   test::TempDir configDir;
-  Account(configDir.path()).write(localhost(closedPort()), std::nullopt);
+  Account(configDir.path()).write(kNothingListens, std::nullopt);
   Plugin plugin;
   plugin.configure(configDir.path());
   const std::pair<std::string, std::string> commands[] = {

@@ -36,10 +36,6 @@ TEST_F(KYNAXMyLocationTest, AHiddenLocationShowsNothingOfThePlaceAndNeverATime) 
   EXPECT_FALSE(visible->prettyTimestamp());
   const std::shared_ptr<KYNAXLocation> asBase = visible;
   EXPECT_FALSE(asBase->prettyTimestamp());
-
-  const auto nowhere = KYNAXMyLocation::myLocation(true, static_cast<const Value*>(nullptr), "ada@example.com");
-  EXPECT_EQ(nowhere->friendLocation(false), "Locating…");
-  EXPECT_EQ(nowhere->friendLocation(true), "No location found");
   assistant->setLanguageCode("fr");
   EXPECT_EQ(hidden->friendLocation(false), "Position masquée");
 }

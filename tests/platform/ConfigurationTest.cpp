@@ -75,13 +75,16 @@ TEST_F(ConfigurationTest, TimeLimitsBelowAMillisecondRoundUp) {
   EXPECT_EQ(errors(), 0u);
 }
 
-// A host that configures another directory must not keep writing into the first one.
-TEST_F(ConfigurationTest, AnotherDirectoryBringsItsOwnPreferences) {
+// A host that configures another directory must not keep writing into the first one, nor keep
+// reading the first one's contacts.
+TEST_F(ConfigurationTest, AnotherDirectoryBringsItsOwnPreferencesAndContacts) {
   services().preferences.get()->setValue("d", "k", Value("first"));
   services().preferences.get()->synchronize("d");
   test::TempDir second;
+  second.write("contacts/s.vcf", test::vcard("UID:s\r\nEMAIL:s@example.com\r\n"));
   services().configure(second.path());
   EXPECT_FALSE(services().preferences.get()->value("d", "k"));
+  EXPECT_EQ(services().contactStore.get()->unifiedContactsMatchingEmailAddress("s@example.com", {}, nullptr).size(), 1u);
   services().configure(configDir->path());
   EXPECT_EQ(services().preferences.get()->value("d", "k"), Value("first"));
 }

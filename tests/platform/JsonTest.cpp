@@ -62,6 +62,9 @@ TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
   const std::string text = toJson(v);
   EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
   EXPECT_TRUE(parseJson(text));
+  std::string written;
+  appendJsonString(written, "a\x01" "b\x1F");
+  EXPECT_EQ(written, "\"a\\u0001b\\u001f\"");
 }
 
 // The readers give the same answers on a tree and on a parsed document read in place.

@@ -66,6 +66,7 @@ TEST_F(PreferencesStoreTest, ACorruptFileReadsAsEmptyAndIsReplacedOnTheNextWrite
     configDir->write("prefs/d.json", corrupt);
     FilePreferencesStore store(dir());
     EXPECT_FALSE(store.value("d", "k")) << corrupt;
+    EXPECT_FALSE(log->messages(LogLevel::Error).empty()) << corrupt;  // the user learns the file was lost
     store.setValue("d", "k", Value(1));
     ASSERT_TRUE(store.synchronize("d"));
     EXPECT_EQ(FilePreferencesStore(dir()).value("d", "k"), Value(1));
@@ -110,12 +111,16 @@ TEST_F(PreferencesStoreTest, AWriterEndedAtAnyMomentLeavesAWholeFileAndNothingEl
 
 TEST_F(PreferencesStoreTest, DomainsThatAreNoFileNamesAreRefused) {
   FilePreferencesStore store(dir());
-  for (const char* bad : {"", "../escape", "a/b", ".hidden", "with space"}) {
+  const std::string tooLong(201, 'd');
+  for (const char* bad : {"", "../escape", "a/b", ".hidden", "with space", tooLong.c_str()}) {
     store.setValue(bad, "k", Value(1));
     EXPECT_FALSE(store.value(bad, "k")) << bad;
     EXPECT_FALSE(store.synchronize(bad)) << bad;
   }
   EXPECT_FALSE(std::filesystem::exists(configDir->path() / "escape.json"));
+  const std::string longest(200, 'd');
+  store.setValue(longest, "k", Value(1));
+  EXPECT_TRUE(store.synchronize(longest));
 }
 
 TEST_F(PreferencesStoreTest, AFailedWriteIsLoggedAndKeepsThePendingValueForTheNextTry) {

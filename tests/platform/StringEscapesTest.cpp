@@ -48,6 +48,9 @@ TEST(Numeric, WholeTextMustBeOneNumber) {
   for (const char* no : {"", "-", ".", "e5", "1e", "1e+", " 1", "1 ", "1,5", "0x10", "٣", "1.2.3", "abc"}) {
     EXPECT_FALSE(isNumeric(no)) << no;
   }
+  for (const std::string_view longer : {"123", "1.55", "1e55"}) {  // a view ends where it ends, digits after it or not
+    EXPECT_TRUE(isNumeric(longer.substr(0, longer.size() - 1))) << longer;
+  }
 }
 
 TEST(Numeric, LeadingIntegerSaturates) {

@@ -14,10 +14,6 @@ class SystemInfoTest : public test::PlatformTest {
     PlatformTest::SetUp();
     ::unsetenv("KYN_APP_TOKEN");
   }
-  void TearDown() override {
-    ::unsetenv("KYN_APP_TOKEN");
-    PlatformTest::TearDown();
-  }
   LinuxSystemInfo info() const {
     return LinuxSystemInfo(LinuxSystemInfo::Paths{configDir->path() / "account.json", configDir->path() / "token",
                                                   configDir->path() / "product_name", configDir->path() / "os-release"});
@@ -97,6 +93,10 @@ TEST_F(SystemInfoTest, DeviceFacts) {
   EXPECT_EQ(facts.osBuildVersion(), "rolling");
   EXPECT_FALSE(osReleaseField("EMPTY=\"\"\n", "EMPTY"));
   configDir->write("product_name", "  \n");
+  EXPECT_FALSE(facts.productType());
+  configDir->write("product_name", std::string(256, 'p'));
+  EXPECT_EQ(facts.productType(), std::string(256, 'p'));
+  configDir->write("product_name", std::string(257, 'p'));  // longer than any product name: not read
   EXPECT_FALSE(facts.productType());
   configDir->write("os-release", "VERSION_ID=12\n");
   EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead

@@ -49,7 +49,6 @@ TEST_F(AgeStringsTest, EveryBandAtItsBoundaries) {
     const char* spoken;
   };
   const Case cases[] = {
-      {0, "Now", "Located just now"},
       {30, "Now", "Located just now"},
       {30.9, "Now", "Located just now"},
       {31, "Over 30 sec ago", "Located more than 30 seconds ago"},
