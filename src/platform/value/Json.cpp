@@ -5,7 +5,6 @@
 #include <simdjson.h>
 
 #include <algorithm>
-#include <atomic>
 #include <charconv>
 #include <cstring>
 #include <limits>
@@ -294,8 +293,8 @@ void convert(const Document& document, std::size_t index, Value& out) {
   }
 }
 
-/// Texts up to this size are read by a kept parser, which keeps its buffers (about fourteen bytes
-/// per byte of text); a larger one gets a parser of its own, so that one large answer does not
+/// Texts up to this size are read by a kept parser, which keeps its buffers (several bytes per byte
+/// of text); a larger one gets a parser of its own, so that one large answer does not
 /// hold its memory for good. Keeping it saves nothing measurable at that size.
 constexpr std::size_t kKeptParserBytes = 256u * 1024u;
 
@@ -322,13 +321,8 @@ class ParserPool {
   ParserPool() { idle_.reserve(kKept); }
   ParserPool(const ParserPool&) = delete;
   ParserPool& operator=(const ParserPool&) = delete;
-  ~ParserPool() { gone_.store(true); }
-  /// A document may outlive the pool at the process's (or the plug-in's) end: its parser is then
-  /// simply freed. The flag needs no destruction, so it can be read after the pool's.
-  [[nodiscard]] static bool gone() noexcept { return gone_.load(); }
 
  private:
-  static inline std::atomic<bool> gone_{false};
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
   std::mutex mutex_;
   std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
@@ -426,16 +420,12 @@ void appendJsonNumber(std::string& out, std::int64_t value) {
 }
 
 struct JsonDocument::Storage {
-  std::unique_ptr<simdjson::dom::parser> parser;  // holds the document simdjson read
-  bool kept = false;                              // the parser goes back to the pool
-  Value value;                                    // the tree of a text that simdjson did not read
+  Document document;  // what simdjson read
+  Value value;        // the tree of a text that simdjson did not read
   Storage() = default;
   Storage(const Storage&) = delete;
   Storage& operator=(const Storage&) = delete;
-  ~Storage() {
-    releaseValue(value);
-    if (kept && parser && !ParserPool::gone()) parserPool().giveBack(std::move(parser));
-  }
+  ~Storage() { releaseValue(value); }
 };
 
 JsonDocument::JsonDocument() noexcept = default;
@@ -454,12 +444,15 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
     JsonDocument::Storage& storage = *document.storage_;
     if (simdjsonMayRead(text)) {
       // simdjson reads several times faster than nlohmann's reader; what it refuses, nlohmann's decides.
-      storage.kept = text.size() <= kKeptParserBytes;
-      storage.parser = storage.kept ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
+      // The parser is lent only for the reading: the document keeps what it read, sized to the text.
+      const bool keep = text.size() <= kKeptParserBytes;
+      auto parser = keep ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
       simdjson::dom::element root;
-      if (storage.parser->parse(text.data(), text.size()).get(root) == simdjson::SUCCESS) {
-        if (!keepsLimits(storage.parser->doc, limits.maxDepth)) return std::nullopt;
-        document.root_ = JsonView::inDocument(&storage.parser->doc, 1);  // the root word comes first
+      const bool read = parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
+      if (keep) parserPool().giveBack(std::move(parser));
+      if (read) {
+        if (!keepsLimits(storage.document, limits.maxDepth)) return std::nullopt;
+        document.root_ = JsonView::inDocument(&storage.document, 1);  // the root word comes first
         return document;
       }
     }
