@@ -564,24 +564,34 @@ bool JsonView::isString() const noexcept { return typeOf(*this) == '"'; }
 bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
 bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
 
-JsonView JsonView::member(std::string_view key) const noexcept {
-  if (kind_ == Kind::Tree) return platform::member(&tree(), key);
-  if (kind_ != Kind::Document) return {};
-  const Document& document = documentOf(ptr_);
+namespace {
+/// `a == b` without the library's three-way comparison, which the member walks notice.
+inline bool sameText(std::string_view a, std::string_view b) noexcept {
+  return a.size() == b.size() && std::memcmp(a.data(), b.data(), a.size()) == 0;
+}
+
+/// Calls `visit(name, index of the value)` for each member of the object at `index`, in order.
+template <class Visit>
+void forEachMember(const Document& document, std::size_t index, Visit&& visit) noexcept {
   const std::uint64_t* tape = document.tape.get();
-  if (static_cast<char>(tape[index_] >> 56) != '{') return {};
   const std::uint8_t* strings = document.string_buf.get();
-  JsonView found;
-  const std::size_t end = closing(document, index_);
-  for (std::size_t i = index_ + 1; i < end;) {
+  const std::size_t end = closing(document, index);
+  for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) {
     const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
     std::uint32_t length = 0;
     std::memcpy(&length, name, sizeof length);
-    if (length == key.size() && std::memcmp(name + sizeof length, key.data(), length) == 0) {
-      found = inDocument(ptr_, i + 1);  // the last one wins
-    }
-    i = after(document, i + 1);
+    visit(std::string_view(reinterpret_cast<const char*>(name + sizeof length), length), i + 1);
   }
+}
+}  // namespace
+
+JsonView JsonView::member(std::string_view key) const noexcept {
+  if (kind_ == Kind::Tree) return platform::member(&tree(), key);
+  if (kind_ != Kind::Document || typeAt(documentOf(ptr_), index_) != '{') return {};
+  JsonView found;
+  forEachMember(documentOf(ptr_), index_, [&](std::string_view name, std::size_t at) {
+    if (sameText(name, key)) found = inDocument(ptr_, at);  // the last one wins
+  });
   return found;
 }
 
@@ -589,26 +599,18 @@ void JsonView::members(std::span<const std::string_view> keys, std::span<JsonVie
   const std::size_t count = std::min(keys.size(), found.size());
   for (std::size_t k = 0; k < count; ++k) found[k] = JsonView();
   if (kind_ == Kind::Tree) {
-    for (std::size_t k = 0; k < count; ++k) found[k] = member(keys[k]);
+    for (std::size_t k = 0; k < count; ++k) found[k] = platform::member(&tree(), keys[k]);
     return;
   }
-  if (kind_ != Kind::Document) return;
-  const Document& document = documentOf(ptr_);
-  const std::uint64_t* tape = document.tape.get();
-  if (static_cast<char>(tape[index_] >> 56) != '{') return;
-  const std::uint8_t* strings = document.string_buf.get();
-  const std::size_t end = closing(document, index_);
-  for (std::size_t i = index_ + 1; i < end; i = after(document, i + 1)) {
-    const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
-    std::uint32_t length = 0;
-    std::memcpy(&length, name, sizeof length);
+  if (kind_ != Kind::Document || typeAt(documentOf(ptr_), index_) != '{') return;
+  forEachMember(documentOf(ptr_), index_, [&](std::string_view name, std::size_t at) {
     for (std::size_t k = 0; k < count; ++k) {
-      if (length == keys[k].size() && std::memcmp(name + sizeof length, keys[k].data(), length) == 0) {
-        found[k] = inDocument(ptr_, i + 1);  // the last one wins
+      if (sameText(name, keys[k])) {
+        found[k] = inDocument(ptr_, at);  // the last one wins
         break;
       }
     }
-  }
+  });
 }
 
 JsonView JsonView::memberNotNull(std::string_view key) const noexcept {
