@@ -9,7 +9,7 @@ namespace kyn {
 using platform::services;
 
 std::string ShowHideLocationResult::description() const {
-  return "(" + platform::toJson(response.toValue()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
+  return "(" + platform::toJson(response().toValue()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
 }
 
 std::string ShowHideLocationCmd::path() const { return std::string(KYNUrlBase) + "showHideLocation"; }
@@ -32,7 +32,6 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
   const platform::JsonView response = jsonResponse();
   if (!response) return nullptr;
   auto out = std::make_shared<ShowHideLocationResult>();
-  out->response = response;
   out->responseDocument = responseDocument();
 
   platform::JsonView myInfo = response.member("myInfo");
@@ -47,7 +46,7 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
   log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
   setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
   if (log.isEnabled(platform::LogLevel::Default)) {
-    log.notice("visibility_response: %@", "(" + platform::toJson(out->response.toValue()) + ")");  // the record is not in yet
+    log.notice("visibility_response: %@", "(" + platform::toJson(response.toValue()) + ")");  // the record is not in yet
   }
 
   // The record shows what was asked for: once the exchange succeeded, the request is trusted.
