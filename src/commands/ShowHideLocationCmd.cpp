@@ -36,15 +36,8 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
 
   platform::JsonView myInfo = response.member("myInfo");
   if (!myInfo.isObject()) myInfo = {};
-  std::optional<Value> context;
-  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
-    context = serverContext.toValue();
-  }
   const auto preferredEmail = platform::stringValue(myInfo.member("preferredEmail"));
-  // Folded into the server's context only: without one there is nothing to carry back.
-  if (preferredEmail && context) (*context)["preferredEmail"] = *preferredEmail;
-  log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
+  takeServerContext(response, preferredEmail ? Value{{"preferredEmail", *preferredEmail}} : Value(), /*logged=*/true);
   if (log.isEnabled(platform::LogLevel::Default)) {
     log.notice("visibility_response: %@", "(" + platform::toJson(response.toValue()) + ")");  // the record is not in yet
   }
