@@ -472,6 +472,9 @@ std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) 
   try {
     auto document = parseJsonDocument(text, limits);
     if (!document) return std::nullopt;
+    // A text that nlohmann's reader read is a tree already and moves out whole; a null tree is null
+    // either way.
+    if (Value& tree = document->storage_->value; !tree.is_null()) return std::move(tree);
     return document->root().toValue();
   } catch (...) {
     return std::nullopt;

@@ -38,6 +38,7 @@ class JsonDocument {
 
  private:
   friend std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept;
+  friend std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept;
   struct Storage;
   std::unique_ptr<Storage> storage_;
   JsonView root_;
