@@ -9,7 +9,7 @@ namespace kyn {
 using platform::services;
 
 std::string ShowHideLocationResult::description() const {
-  return "(" + platform::toJson(response().toValue()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
+  return "(" + platform::toJson(response()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
 }
 
 std::string ShowHideLocationCmd::path() const { return std::string(KYNUrlBase) + "showHideLocation"; }
@@ -39,7 +39,7 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
   const auto preferredEmail = platform::stringValue(myInfo.member("preferredEmail"));
   takeServerContext(response, preferredEmail ? Value{{"preferredEmail", *preferredEmail}} : Value(), /*logged=*/true);
   if (log.isEnabled(platform::LogLevel::Default)) {
-    log.notice("visibility_response: %@", "(" + platform::toJson(response.toValue()) + ")");  // the record is not in yet
+    log.notice("visibility_response: %@", "(" + platform::toJson(response) + ")");  // the record is not in yet
   }
 
   // The record shows what was asked for: once the exchange succeeded, the request is trusted.

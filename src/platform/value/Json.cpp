@@ -545,6 +545,9 @@ struct JsonViewAccess {
     }
   }
 
+  static const Value* tree(const JsonView& view) noexcept {
+    return view.kind_ == JsonView::Kind::Tree ? &view.tree() : nullptr;
+  }
   static const Document& document(const JsonView& view) noexcept { return documentOf(view.ptr_); }
   static std::size_t index(const JsonView& view) noexcept { return view.index_; }
   static bool inDocument(const JsonView& view) noexcept { return view.kind_ == JsonView::Kind::Document; }
@@ -737,6 +740,15 @@ std::int32_t int32Value(JsonView value) noexcept {
 std::string toJson(const Value& value, int indent) noexcept {
   try {
     return value.dump(indent, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+  } catch (...) {
+    return "null";
+  }
+}
+
+std::string toJson(JsonView value, int indent) noexcept {
+  if (const Value* tree = JsonViewAccess::tree(value)) return toJson(*tree, indent);
+  try {
+    return toJson(value.toValue(), indent);
   } catch (...) {
     return "null";
   }
