@@ -75,13 +75,7 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
 
   std::vector<std::shared_ptr<AXKynLocation>> found;
 
-  std::optional<Value> context;
-  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
-    context = serverContext.toValue();
-    if (incomplete) (*context)["incomplete"] = true;
-  }
-  log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
+  takeServerContext(response, incomplete ? Value{{"incomplete", true}} : Value(), /*logged=*/true);
 
   // Each handle is looked up once: index the entries and the friends first, so that the walk stays
   // linear in the number of friends. Of a handle the answer repeats, the last entry counts, at the

@@ -2,6 +2,7 @@
 
 #include "account/Common.h"
 #include "platform/Services.h"
+#include "utils/KYNAXUtils.h"
 
 namespace kyn {
 
@@ -37,6 +38,18 @@ platform::JsonView KYNBaseCmd::jsonResponse() {
 double KYNBaseCmd::minCallbackInterval() {
   const auto ms = platform::numberValue(jsonResponse().member("serverContext").member("minCallbackIntervalInMS"));
   return ms ? *ms / 1000.0 : 0.0;
+}
+
+void KYNBaseCmd::takeServerContext(platform::JsonView response, const Value& added, bool logged) {
+  std::optional<Value> context;
+  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
+    context = serverContext.toValue();  // a tree: of a repeated key only the last value goes on
+    if (added.is_object()) {
+      for (const auto& [key, value] : added.items()) (*context)[key] = value;
+    }
+  }
+  if (logged) platform::services().log().notice("serverContextDictionary: %@", context ? &*context : nullptr);
+  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
 }
 
 Value KYNBaseCmd::makeClientContext() {

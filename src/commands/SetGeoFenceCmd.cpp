@@ -105,9 +105,7 @@ std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
     handle = handles.empty() ? std::nullopt : std::optional(std::move(handles.back()));
   }
 
-  const platform::JsonView serverContext = response.member("serverContext");
-  const Value context = serverContext.isObject() ? serverContext.toValue() : Value();
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(serverContext.isObject() ? &context : nullptr));
+  takeServerContext(response, Value(), /*logged=*/false);
 
   auto geoFence = std::make_shared<AXKynGeoFence>();
   geoFence->trigger = trigger;

@@ -9,7 +9,7 @@ namespace kyn {
 using platform::services;
 
 std::string ShowHideLocationResult::description() const {
-  return "(" + platform::toJson(response.toValue()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
+  return "(" + platform::toJson(response()) + ", " + (myLocation ? myLocation->description() : std::string("(null)")) + ")";
 }
 
 std::string ShowHideLocationCmd::path() const { return std::string(KYNUrlBase) + "showHideLocation"; }
@@ -32,22 +32,14 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
   const platform::JsonView response = jsonResponse();
   if (!response) return nullptr;
   auto out = std::make_shared<ShowHideLocationResult>();
-  out->response = response;
   out->responseDocument = responseDocument();
 
   platform::JsonView myInfo = response.member("myInfo");
   if (!myInfo.isObject()) myInfo = {};
-  std::optional<Value> context;
-  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
-    context = serverContext.toValue();
-  }
   const auto preferredEmail = platform::stringValue(myInfo.member("preferredEmail"));
-  // Folded into the server's context only: without one there is nothing to carry back.
-  if (preferredEmail && context) (*context)["preferredEmail"] = *preferredEmail;
-  log.notice("serverContextDictionary: %@", context ? &*context : nullptr);
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
+  takeServerContext(response, preferredEmail ? Value{{"preferredEmail", *preferredEmail}} : Value(), /*logged=*/true);
   if (log.isEnabled(platform::LogLevel::Default)) {
-    log.notice("visibility_response: %@", "(" + platform::toJson(out->response.toValue()) + ")");  // the record is not in yet
+    log.notice("visibility_response: %@", "(" + platform::toJson(response) + ")");  // the record is not in yet
   }
 
   // The record shows what was asked for: once the exchange succeeded, the request is trusted.

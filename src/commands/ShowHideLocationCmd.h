@@ -14,8 +14,11 @@ namespace kyn {
 /// What a show/hide request gives back, in this order: the server's whole response, then the
 /// user's own location record as friends now see it.
 struct ShowHideLocationResult final : platform::Object {
-  platform::JsonView response;
-  std::shared_ptr<const platform::JsonDocument> responseDocument;  // what `response` reads
+  std::shared_ptr<const platform::JsonDocument> responseDocument;
+  /// The response, read in place in `responseDocument`.
+  [[nodiscard]] platform::JsonView response() const noexcept {
+    return responseDocument ? responseDocument->root() : platform::JsonView();
+  }
   std::shared_ptr<KYNAXMyLocation> myLocation;
 
   /// "(response, record)"

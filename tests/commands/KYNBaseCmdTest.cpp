@@ -52,7 +52,7 @@ TEST_F(KYNBaseCmdTest, EveryParseSetsTheStatusCodeAsItCame) {
       {"not json", std::nullopt}, {"[1,2]", std::nullopt}};
   for (const auto& [body, status] : bodies) {
     command.setResponseBody(body);
-    EXPECT_EQ(command.jsonResponseDictionary() != nullptr, body[0] == '{') << body;
+    EXPECT_EQ(static_cast<bool>(command.jsonResponse()), body[0] == '{') << body;
     EXPECT_EQ(command.statusCode(), status) << body;
   }
 }

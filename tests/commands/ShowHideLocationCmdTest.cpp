@@ -34,7 +34,7 @@ TEST_F(ShowHideLocationCmdTest, TheResultIsTheResponseAndTheRecordAsRequested) {
   command.setResponseBody(body);
   const auto result = command.result();
   ASSERT_TRUE(result);
-  EXPECT_EQ(result->response.toValue(), Value::parse(body));
+  EXPECT_EQ(result->response().toValue(), Value::parse(body));
   EXPECT_EQ(command.statusCode(), Value(200));
   EXPECT_EQ(KYNAXUtils::contextDictionaryForURL(*command.contextIdentifierURL()),
             Value::parse(R"({"a":1,"preferredEmail":"sam@example.com"})"));

@@ -8,14 +8,12 @@
 
 namespace kyn::platform {
 
-FormatArg::FormatArg(const Value& value)
-    : v_(value.is_string() ? value.get<std::string>() : toJson(value)) {}
+FormatArg::FormatArg(const Value& value) : FormatArg(JsonView(&value)) {}
 
-FormatArg::FormatArg(const Value* value)
-    : v_(value == nullptr ? std::string("(null)") : (value->is_string() ? value->get<std::string>() : toJson(*value))) {}
+FormatArg::FormatArg(const Value* value) : FormatArg(JsonView(value)) {}
 
 FormatArg::FormatArg(JsonView value)
-    : v_(!value ? std::string("(null)") : value.isString() ? std::string(*value.string()) : toJson(value.toValue())) {}
+    : v_(!value ? std::string("(null)") : value.isString() ? std::string(*value.string()) : toJson(value)) {}
 
 std::string FormatArg::text() const {
   if (const auto* s = std::get_if<std::string>(&v_)) return *s;

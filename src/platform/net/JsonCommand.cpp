@@ -22,9 +22,7 @@ std::string_view describeTransferError(KYTransferError error) noexcept {
   return "unknown failure";
 }
 
-KYJSONCommand::~KYJSONCommand() {
-  if (responseTree_) releaseValue(*responseTree_);
-}
+KYJSONCommand::~KYJSONCommand() = default;
 
 std::string KYJSONCommand::path() const { return "/"; }
 
@@ -39,18 +37,9 @@ std::optional<std::string> KYJSONCommand::url() const {
 
 JsonView KYJSONCommand::jsonResponse() { return parsedResponse_ ? parsedResponse_->root() : JsonView(); }
 
-const Value* KYJSONCommand::jsonResponseDictionary() {
-  const JsonView response = jsonResponse();
-  if (!response) return nullptr;
-  if (!responseTree_) responseTree_ = response.toValue();
-  return &*responseTree_;
-}
-
 double KYJSONCommand::minCallbackInterval() { return 0.0; }
 
 void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& limits) {
-  if (responseTree_) releaseValue(*responseTree_);
-  responseTree_.reset();
   auto parsed = parseJsonDocument(body, limits);
   if (parsed && parsed->root().isObject()) parsedResponse_ = std::make_shared<const JsonDocument>(std::move(*parsed));
   else parsedResponse_.reset();

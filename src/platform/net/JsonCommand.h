@@ -74,8 +74,6 @@ class KYJSONCommand : public Object {
   /// The response body parsed as a JSON object, read in place; absent when there is no body, it is
   /// not JSON, or not an object. Valid until the next `setResponseBody` or the command's end.
   [[nodiscard]] virtual JsonView jsonResponse();
-  /// The same as a tree, made on first use, for callers that need a dictionary; nullptr when absent.
-  [[nodiscard]] const Value* jsonResponseDictionary();
   /// The document `jsonResponse` reads, for results that keep the response beyond the command.
   [[nodiscard]] const std::shared_ptr<const JsonDocument>& responseDocument() const noexcept { return parsedResponse_; }
   /// The minimum interval, in seconds, the server asked for between calls; 0 unless overridden.
@@ -135,7 +133,6 @@ class KYJSONCommand : public Object {
   std::string errorDetail_;
   std::optional<HTTPResponse> response_;
   std::shared_ptr<const JsonDocument> parsedResponse_;
-  std::optional<Value> responseTree_;
   bool redirected_ = false;
   std::optional<std::string> originalHost_;
   std::optional<std::string> redirectedHost_;

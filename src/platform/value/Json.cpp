@@ -5,7 +5,6 @@
 #include <simdjson.h>
 
 #include <algorithm>
-#include <atomic>
 #include <charconv>
 #include <cstring>
 #include <limits>
@@ -294,8 +293,8 @@ void convert(const Document& document, std::size_t index, Value& out) {
   }
 }
 
-/// Texts up to this size are read by a kept parser, which keeps its buffers (about fourteen bytes
-/// per byte of text); a larger one gets a parser of its own, so that one large answer does not
+/// Texts up to this size are read by a kept parser, which keeps its buffers (several bytes per byte
+/// of text); a larger one gets a parser of its own, so that one large answer does not
 /// hold its memory for good. Keeping it saves nothing measurable at that size.
 constexpr std::size_t kKeptParserBytes = 256u * 1024u;
 
@@ -322,13 +321,8 @@ class ParserPool {
   ParserPool() { idle_.reserve(kKept); }
   ParserPool(const ParserPool&) = delete;
   ParserPool& operator=(const ParserPool&) = delete;
-  ~ParserPool() { gone_.store(true); }
-  /// A document may outlive the pool at the process's (or the plug-in's) end: its parser is then
-  /// simply freed. The flag needs no destruction, so it can be read after the pool's.
-  [[nodiscard]] static bool gone() noexcept { return gone_.load(); }
 
  private:
-  static inline std::atomic<bool> gone_{false};
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
   std::mutex mutex_;
   std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
@@ -426,16 +420,12 @@ void appendJsonNumber(std::string& out, std::int64_t value) {
 }
 
 struct JsonDocument::Storage {
-  std::unique_ptr<simdjson::dom::parser> parser;  // holds the document simdjson read
-  bool kept = false;                              // the parser goes back to the pool
-  Value value;                                    // the tree of a text that simdjson did not read
+  Document document;  // what simdjson read
+  Value value;        // the tree of a text that simdjson did not read
   Storage() = default;
   Storage(const Storage&) = delete;
   Storage& operator=(const Storage&) = delete;
-  ~Storage() {
-    releaseValue(value);
-    if (kept && parser && !ParserPool::gone()) parserPool().giveBack(std::move(parser));
-  }
+  ~Storage() { releaseValue(value); }
 };
 
 JsonDocument::JsonDocument() noexcept = default;
@@ -454,12 +444,15 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
     JsonDocument::Storage& storage = *document.storage_;
     if (simdjsonMayRead(text)) {
       // simdjson reads several times faster than nlohmann's reader; what it refuses, nlohmann's decides.
-      storage.kept = text.size() <= kKeptParserBytes;
-      storage.parser = storage.kept ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
+      // The parser is lent only for the reading: the document keeps what it read, sized to the text.
+      const bool keep = text.size() <= kKeptParserBytes;
+      auto parser = keep ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
       simdjson::dom::element root;
-      if (storage.parser->parse(text.data(), text.size()).get(root) == simdjson::SUCCESS) {
-        if (!keepsLimits(storage.parser->doc, limits.maxDepth)) return std::nullopt;
-        document.root_ = JsonView::inDocument(&storage.parser->doc, 1);  // the root word comes first
+      const bool read = parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
+      if (keep) parserPool().giveBack(std::move(parser));
+      if (read) {
+        if (!keepsLimits(storage.document, limits.maxDepth)) return std::nullopt;
+        document.root_ = JsonView::inDocument(&storage.document, 1);  // the root word comes first
         return document;
       }
     }
@@ -479,6 +472,9 @@ std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) 
   try {
     auto document = parseJsonDocument(text, limits);
     if (!document) return std::nullopt;
+    // A text that nlohmann's reader read is a tree already and moves out whole; a null tree is null
+    // either way.
+    if (Value& tree = document->storage_->value; !tree.is_null()) return std::move(tree);
     return document->root().toValue();
   } catch (...) {
     return std::nullopt;
@@ -549,6 +545,9 @@ struct JsonViewAccess {
     }
   }
 
+  static const Value* tree(const JsonView& view) noexcept {
+    return view.kind_ == JsonView::Kind::Tree ? &view.tree() : nullptr;
+  }
   static const Document& document(const JsonView& view) noexcept { return documentOf(view.ptr_); }
   static std::size_t index(const JsonView& view) noexcept { return view.index_; }
   static bool inDocument(const JsonView& view) noexcept { return view.kind_ == JsonView::Kind::Document; }
@@ -571,24 +570,34 @@ bool JsonView::isString() const noexcept { return typeOf(*this) == '"'; }
 bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
 bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
 
-JsonView JsonView::member(std::string_view key) const noexcept {
-  if (kind_ == Kind::Tree) return platform::member(&tree(), key);
-  if (kind_ != Kind::Document) return {};
-  const Document& document = documentOf(ptr_);
+namespace {
+/// `a == b` without the library's three-way comparison, which the member walks notice.
+inline bool sameText(std::string_view a, std::string_view b) noexcept {
+  return a.size() == b.size() && std::memcmp(a.data(), b.data(), a.size()) == 0;
+}
+
+/// Calls `visit(name, index of the value)` for each member of the object at `index`, in order.
+template <class Visit>
+void forEachMember(const Document& document, std::size_t index, Visit&& visit) noexcept {
   const std::uint64_t* tape = document.tape.get();
-  if (static_cast<char>(tape[index_] >> 56) != '{') return {};
   const std::uint8_t* strings = document.string_buf.get();
-  JsonView found;
-  const std::size_t end = closing(document, index_);
-  for (std::size_t i = index_ + 1; i < end;) {
+  const std::size_t end = closing(document, index);
+  for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) {
     const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
     std::uint32_t length = 0;
     std::memcpy(&length, name, sizeof length);
-    if (length == key.size() && std::memcmp(name + sizeof length, key.data(), length) == 0) {
-      found = inDocument(ptr_, i + 1);  // the last one wins
-    }
-    i = after(document, i + 1);
+    visit(std::string_view(reinterpret_cast<const char*>(name + sizeof length), length), i + 1);
   }
+}
+}  // namespace
+
+JsonView JsonView::member(std::string_view key) const noexcept {
+  if (kind_ == Kind::Tree) return platform::member(&tree(), key);
+  if (kind_ != Kind::Document || typeAt(documentOf(ptr_), index_) != '{') return {};
+  JsonView found;
+  forEachMember(documentOf(ptr_), index_, [&](std::string_view name, std::size_t at) {
+    if (sameText(name, key)) found = inDocument(ptr_, at);  // the last one wins
+  });
   return found;
 }
 
@@ -596,26 +605,18 @@ void JsonView::members(std::span<const std::string_view> keys, std::span<JsonVie
   const std::size_t count = std::min(keys.size(), found.size());
   for (std::size_t k = 0; k < count; ++k) found[k] = JsonView();
   if (kind_ == Kind::Tree) {
-    for (std::size_t k = 0; k < count; ++k) found[k] = member(keys[k]);
+    for (std::size_t k = 0; k < count; ++k) found[k] = platform::member(&tree(), keys[k]);
     return;
   }
-  if (kind_ != Kind::Document) return;
-  const Document& document = documentOf(ptr_);
-  const std::uint64_t* tape = document.tape.get();
-  if (static_cast<char>(tape[index_] >> 56) != '{') return;
-  const std::uint8_t* strings = document.string_buf.get();
-  const std::size_t end = closing(document, index_);
-  for (std::size_t i = index_ + 1; i < end; i = after(document, i + 1)) {
-    const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
-    std::uint32_t length = 0;
-    std::memcpy(&length, name, sizeof length);
+  if (kind_ != Kind::Document || typeAt(documentOf(ptr_), index_) != '{') return;
+  forEachMember(documentOf(ptr_), index_, [&](std::string_view name, std::size_t at) {
     for (std::size_t k = 0; k < count; ++k) {
-      if (length == keys[k].size() && std::memcmp(name + sizeof length, keys[k].data(), length) == 0) {
-        found[k] = inDocument(ptr_, i + 1);  // the last one wins
+      if (sameText(name, keys[k])) {
+        found[k] = inDocument(ptr_, at);  // the last one wins
         break;
       }
     }
-  }
+  });
 }
 
 JsonView JsonView::memberNotNull(std::string_view key) const noexcept {
@@ -739,6 +740,15 @@ std::int32_t int32Value(JsonView value) noexcept {
 std::string toJson(const Value& value, int indent) noexcept {
   try {
     return value.dump(indent, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+  } catch (...) {
+    return "null";
+  }
+}
+
+std::string toJson(JsonView value, int indent) noexcept {
+  if (const Value* tree = JsonViewAccess::tree(value)) return toJson(*tree, indent);
+  try {
+    return toJson(value.toValue(), indent);
   } catch (...) {
     return "null";
   }

@@ -38,6 +38,7 @@ class JsonDocument {
 
  private:
   friend std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept;
+  friend std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept;
   struct Storage;
   std::unique_ptr<Storage> storage_;
   JsonView root_;
@@ -48,6 +49,8 @@ class JsonDocument {
 
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
+/// The same for a view; "null" when it is absent.
+[[nodiscard]] std::string toJson(JsonView value, int indent = -1) noexcept;
 
 /// Empties `value` from its leaves up, for a value about to go: the library's own teardown moves
 /// every member of each nested value through a stack it allocates, which costs more than the
