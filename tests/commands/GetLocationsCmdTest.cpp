@@ -108,6 +108,9 @@ TEST_F(GetLocationsCmdTest, NotAFriendIsLeftOutAndTheLastMatchWins) {
   EXPECT_EQ(handlesOf(command->result()), (std::vector<std::string>{"a@example.com", "b@example.com"}));
   EXPECT_EQ(command->atRequestedLocation, false);  // b's, since c was skipped
   EXPECT_TRUE(answered(R"({"locations":{"a@example.com":{"status":"411"}}})")->result()->empty());
+  auto unmatched = answered(R"({"locations":{"a@example.com":{"match":true},"b@example.com":{}}})");
+  ASSERT_TRUE(unmatched->result());
+  EXPECT_EQ(unmatched->atRequestedLocation, false);  // an entry without "match" is not at the place
 }
 
 TEST_F(GetLocationsCmdTest, TheAssistantsOwnPersonIsUsedForItsHandle) {

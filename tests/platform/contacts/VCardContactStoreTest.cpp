@@ -68,14 +68,14 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   book.write("1.vcf", test::vcard("UID:u-1\r\nN:Example;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
                            photo));
   book.write("2.vcf", test::vcard("UID:other\r\nFN:Someone Else\r\n"));
-  book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nX-MAIDENNAME:Sample\r\n"
+  book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
                            "X-PHONETIC-MIDDLE-NAME:Ree\r\nNOTE:n\r\nNICKNAME:Annie\r\n"
                            "TEL;TYPE=CELL:+1 503 555 0110\r\nTEL;TYPE=HOME:+1 503 555 0110\r\nEMAIL:ann@example.org\r\n"
                            "PHOTO;ENCODING=b:iVBORw==\r\n"));
   VCardContactStore store(book.path(), "us");
   EXPECT_EQ(store.load(), 2u);
   const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "jobTitle", "previousFamilyName",
-                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneNumbers", "emailAddresses", "imageData"},
+                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
   EXPECT_EQ(ann->familyName, "Example");  // the first card's value
@@ -86,6 +86,7 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   EXPECT_EQ(ann->nickname, "Annie");
   EXPECT_EQ(ann->nameSuffix, "III");
   EXPECT_EQ(ann->phoneticMiddleName, "Ree");
+  EXPECT_EQ(ann->departmentName, "Ops");
   EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
   EXPECT_EQ(ann->emailAddresses.size(), 2u);
   ASSERT_TRUE(ann->imageData);
