@@ -28,13 +28,6 @@ Value KYNBaseCmd::jsonBodyDictionary() const {
   return body;
 }
 
-platform::JsonView KYNBaseCmd::jsonResponse() {
-  const platform::JsonView response = KYJSONCommand::jsonResponse();
-  const platform::JsonView code = response.memberNotNull("statusCode");
-  statusCode_ = code ? std::optional<Value>(code.toValue()) : std::nullopt;
-  return response;
-}
-
 double KYNBaseCmd::minCallbackInterval() {
   const auto ms = platform::numberValue(jsonResponse().member("serverContext").member("minCallbackIntervalInMS"));
   return ms ? *ms / 1000.0 : 0.0;

@@ -24,8 +24,6 @@ class KYNBaseCmd : public platform::KYJSONCommand {
   [[nodiscard]] Value headers() const override;
   /// The base body plus "clientContext".
   [[nodiscard]] Value jsonBodyDictionary() const override;
-  /// The parsed response, unchanged; sets `statusCode` from it (nothing when absent or null).
-  [[nodiscard]] platform::JsonView jsonResponse() override;
   /// "minCallbackIntervalInMS" of the response's "serverContext", in seconds; 0 when absent.
   [[nodiscard]] double minCallbackInterval() override;
 
@@ -35,11 +33,11 @@ class KYNBaseCmd : public platform::KYJSONCommand {
   /// each only when known.
   [[nodiscard]] static Value makeClientContext();
 
-  /// "statusCode" of the last parsed response, as it came (a number or a numeric string).
-  [[nodiscard]] const std::optional<Value>& statusCode() const noexcept { return statusCode_; }
-  /// The same as a pointer for the value readers: null when absent.
-  [[nodiscard]] const Value* statusCodeValue() const noexcept { return statusCode_ ? &*statusCode_ : nullptr; }
-  void setStatusCode(std::optional<Value> code) { statusCode_ = std::move(code); }
+  /// "statusCode" of the last parsed response, as it came (a number or a numeric string); absent
+  /// when missing or null.
+  [[nodiscard]] platform::JsonView statusCodeValue() const noexcept {
+    return responseDocument() ? responseDocument()->root().memberNotNull("statusCode") : platform::JsonView();
+  }
   /// The server context of the last response as a context identifier URL.
   [[nodiscard]] const std::optional<std::string>& contextIdentifierURL() const noexcept { return contextIdentifierURL_; }
   void setContextIdentifierURL(std::optional<std::string> url) { contextIdentifierURL_ = std::move(url); }
@@ -53,7 +51,6 @@ class KYNBaseCmd : public platform::KYJSONCommand {
   void takeServerContext(platform::JsonView response, const Value& added, bool logged);
 
  private:
-  std::optional<Value> statusCode_;
   std::optional<std::string> contextIdentifierURL_;
 };
 

@@ -226,7 +226,6 @@ class AXRecord : public AXObject {
     detail::FieldReader reader{dictionary};
     Derived::fields(into, reader);
   }
-  static void readFields(Derived& into, const Value& dictionary) { readFields(into, platform::JsonView(&dictionary)); }
 
   [[nodiscard]] static std::shared_ptr<Derived> fromDictionary(platform::JsonView dictionary) {
     auto record = std::make_shared<Derived>();

@@ -229,7 +229,8 @@ std::string toUtf8(std::string bytes, std::string_view charset) {
     }
     if (isValidUtf8(bytes)) return bytes;
   }
-  // ICU's windows-1252 converter maps every byte (the few unassigned ones to U+FFFD).
+  // ICU's windows-1252 converter maps every byte (the few unassigned ones to U+FFFD). Only an ICU
+  // built without that converter gets past it; then the text is at least valid UTF-8.
   if (auto converted = convertWith("windows-1252", bytes)) return *converted;
   return repairUtf8(std::move(bytes));
 }

@@ -579,15 +579,8 @@ inline bool sameText(std::string_view a, std::string_view b) noexcept {
 /// Calls `visit(name, index of the value)` for each member of the object at `index`, in order.
 template <class Visit>
 void forEachMember(const Document& document, std::size_t index, Visit&& visit) noexcept {
-  const std::uint64_t* tape = document.tape.get();
-  const std::uint8_t* strings = document.string_buf.get();
   const std::size_t end = closing(document, index);
-  for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) {
-    const std::uint8_t* name = strings + (tape[i] & simdjson::internal::JSON_VALUE_MASK);
-    std::uint32_t length = 0;
-    std::memcpy(&length, name, sizeof length);
-    visit(std::string_view(reinterpret_cast<const char*>(name + sizeof length), length), i + 1);
-  }
+  for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) visit(stringAt(document, i), i + 1);
 }
 }  // namespace
 
