@@ -97,6 +97,8 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     for (const auto& item : v.member("a")) items.push_back(toJson(item.value.toValue()));
     EXPECT_EQ(items, (std::vector<std::string>{"1", R"({"k":2})", R"("z")"}));
     EXPECT_EQ(v.toValue(), tree);
+    EXPECT_EQ(toJson(v.member("a")), R"([1,{"k":2},"z"])");
+    EXPECT_EQ(toJson(v.member("neg")), "-3.2");
   }
   EXPECT_EQ(member(nullptr, "s"), nullptr);
   EXPECT_EQ(member(Value::array(), "s"), nullptr);

@@ -738,10 +738,45 @@ std::string toJson(const Value& value, int indent) noexcept {
   }
 }
 
+namespace {
+// A document's value written as compact JSON in document order, without building a tree (the raw
+// answers are logged per command). A repeated key is written as often as it came.
+void appendView(std::string& out, JsonView value) {
+  switch (JsonViewAccess::type(value)) {
+    case '[':
+    case '{': {
+      const bool object = value.isObject();
+      out += object ? '{' : '[';
+      bool first = true;
+      for (const auto& [key, item] : value) {
+        if (!std::exchange(first, false)) out += ',';
+        if (object) {
+          appendJsonString(out, key);
+          out += ':';
+        }
+        appendView(out, item);
+      }
+      out += object ? '}' : ']';
+      return;
+    }
+    case '"': appendJsonString(out, *value.string()); return;
+    case 't': out += "true"; return;
+    case 'f': out += "false"; return;
+    case 'l': appendJsonNumber(out, JsonViewAccess::number(value).i); return;
+    case 'u': out += std::to_string(JsonViewAccess::number(value).u); return;
+    case 'd': appendJsonNumber(out, JsonViewAccess::number(value).d); return;
+    default: out += "null"; return;
+  }
+}
+}  // namespace
+
 std::string toJson(JsonView value, int indent) noexcept {
   if (const Value* tree = JsonViewAccess::tree(value)) return toJson(*tree, indent);
   try {
-    return toJson(value.toValue(), indent);
+    if (indent >= 0 || !value) return toJson(value.toValue(), indent);
+    std::string out;
+    appendView(out, value);
+    return out;
   } catch (...) {
     return "null";
   }
