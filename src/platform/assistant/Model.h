@@ -9,7 +9,9 @@
 #include "platform/value/Json.h"
 #include "platform/value/Value.h"
 
+#include <array>
 #include <cmath>
+#include <cstdlib>
 #include <cstdint>
 #include <functional>
 #include <memory>
@@ -156,28 +158,66 @@ struct FieldJsonWriter {
   }
 };
 
-/// Reads fields from a dictionary; a value of the wrong type leaves its field absent.
-struct FieldReader {
-  platform::JsonView in;
+/// Lists a record's field names, in order.
+struct FieldNames {
+  std::string_view* names;
+  std::size_t count = 0;
+  std::size_t room;
+  template <class T>
+  void operator()(const char* key, const T& /*v*/) {
+    if (count < room) names[count] = key;
+    ++count;
+  }
+};
 
-  void operator()(const char* key, std::optional<std::string>& v) const { v = platform::stringValue(in.member(key)); }
-  void operator()(const char* key, std::optional<double>& v) const {
-    auto n = platform::numberValue(in.member(key));
+/// A record's field names, listed once per record type.
+template <class Derived>
+struct FieldKeys {
+  static constexpr std::size_t kMax = 16;
+  std::array<std::string_view, kMax> names{};
+  std::size_t count = 0;
+
+  static const FieldKeys& get() {
+    static const FieldKeys keys = [] {
+      FieldKeys k;
+      Derived record;
+      FieldNames lister{k.names.data(), 0, kMax};
+      Derived::fields(record, lister);
+      // A record with more fields than there is room for is a programming error that the first
+      // read of it shows; raise kMax.
+      if (lister.count > kMax) std::abort();
+      k.count = lister.count;
+      return k;
+    }();
+    return keys;
+  }
+};
+
+/// Reads fields from the values found for them, field by field in order; a value of the wrong type
+/// leaves its field absent.
+struct FieldReader {
+  const platform::JsonView* found;
+  std::size_t next = 0;
+
+  platform::JsonView take() { return found[next++]; }
+  void operator()(const char* /*key*/, std::optional<std::string>& v) { v = platform::stringValue(take()); }
+  void operator()(const char* /*key*/, std::optional<double>& v) {
+    auto n = platform::numberValue(take());
     v = (n && std::isfinite(*n)) ? n : std::nullopt;
   }
-  void operator()(const char* key, std::optional<bool>& v) const { v = platform::boolValue(in.member(key)); }
-  void operator()(const char* key, std::optional<std::int64_t>& v) const {
-    const platform::JsonView m = in.member(key);
+  void operator()(const char* /*key*/, std::optional<bool>& v) { v = platform::boolValue(take()); }
+  void operator()(const char* /*key*/, std::optional<std::int64_t>& v) {
+    const platform::JsonView m = take();
     v = m.isNumber() ? std::optional<std::int64_t>(platform::integerValue(m)) : std::nullopt;
   }
   template <class T>
-  void operator()(const char* key, std::shared_ptr<T>& v) const {
-    const platform::JsonView m = in.member(key);
+  void operator()(const char* /*key*/, std::shared_ptr<T>& v) {
+    const platform::JsonView m = take();
     v = m.isObject() ? T::fromDictionary(m) : nullptr;
   }
   template <class T>
-  void operator()(const char* key, AXArray<T>& v) const {
-    const platform::JsonView m = in.member(key);
+  void operator()(const char* /*key*/, AXArray<T>& v) {
+    const platform::JsonView m = take();
     if (!m.isArray()) {
       v.reset();
       return;
@@ -223,7 +263,11 @@ class AXRecord : public AXObject {
 
   /// Fills `into` from a dictionary of this record's layout (a tree or a parsed document).
   static void readFields(Derived& into, platform::JsonView dictionary) {
-    detail::FieldReader reader{dictionary};
+    // All fields in one walk over the dictionary's members.
+    const auto& keys = detail::FieldKeys<Derived>::get();
+    std::array<platform::JsonView, detail::FieldKeys<Derived>::kMax> found;
+    dictionary.members({keys.names.data(), keys.count}, {found.data(), keys.count});
+    detail::FieldReader reader{found.data()};
     Derived::fields(into, reader);
   }
 
