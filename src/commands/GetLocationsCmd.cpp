@@ -75,7 +75,9 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
 
   std::vector<std::shared_ptr<AXKynLocation>> found;
 
-  takeServerContext(response, incomplete ? Value{{"incomplete", true}} : Value(), /*logged=*/true);
+  static const Value kTrue = true;
+  takeServerContext(response, incomplete ? std::optional<platform::JsonEntry>({"incomplete", &kTrue}) : std::nullopt,
+                    /*logged=*/true);
 
   // Each handle is looked up once: index the entries and the friends first, so that the walk stays
   // linear in the number of friends. Of a handle the answer repeats, the last entry counts, at the

@@ -4,6 +4,8 @@
 #include "platform/Services.h"
 #include "utils/KYNAXUtils.h"
 
+#include <algorithm>
+
 namespace kyn {
 
 KYNBaseCmd::KYNBaseCmd() {
@@ -33,16 +35,27 @@ double KYNBaseCmd::minCallbackInterval() {
   return ms ? *ms / 1000.0 : 0.0;
 }
 
-void KYNBaseCmd::takeServerContext(platform::JsonView response, const Value& added, bool logged) {
-  std::optional<Value> context;
-  if (const platform::JsonView serverContext = response.member("serverContext"); serverContext.isObject()) {
-    context = serverContext.toValue();  // a tree: of a repeated key only the last value goes on
-    if (added.is_object()) {
-      for (const auto& [key, value] : added.items()) (*context)[key] = value;
-    }
+void KYNBaseCmd::takeServerContext(platform::JsonView response, std::optional<platform::JsonEntry> added, bool logged) {
+  auto& log = platform::services().log();
+  const platform::JsonView serverContext = response.member("serverContext");
+  if (!serverContext.isObject()) {
+    if (logged) log.notice("serverContextDictionary: %@", static_cast<const Value*>(nullptr));
+    setContextIdentifierURL(std::nullopt);
+    return;
   }
-  if (logged) platform::services().log().notice("serverContextDictionary: %@", context ? &*context : nullptr);
-  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForDictionary(context ? &*context : nullptr));
+  // The context as a copy would hold it (of a repeated key only the last value), read in place.
+  std::vector<platform::JsonEntry> members = platform::uniqueMembers(serverContext);
+  if (added) {
+    const auto same = std::find_if(members.begin(), members.end(), [&](const auto& m) { return m.key == added->key; });
+    if (same != members.end()) same->value = added->value;
+    else members.push_back(*added);
+  }
+  if (logged && log.isEnabled(platform::LogLevel::Default)) {
+    Value context = Value::object();
+    for (const auto& [key, value] : members) context[std::string(key)] = value.toValue();
+    log.notice("serverContextDictionary: %@", &context);
+  }
+  setContextIdentifierURL(KYNAXUtils::contextIdentifierURLForMembers(members));
 }
 
 Value KYNBaseCmd::makeClientContext() {

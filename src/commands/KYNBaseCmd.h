@@ -45,10 +45,10 @@ class KYNBaseCmd : public platform::KYJSONCommand {
   [[nodiscard]] std::string_view commandName() const override { return "KYNBaseCmd"; }
 
  protected:
-  /// Sets `contextIdentifierURL` from a copy of the response's "serverContext" with the members of
-  /// `added` (an object, or null for none) set in it; none when the response holds no such object,
-  /// and then nothing is added. With `logged`, writes the context to the log first.
-  void takeServerContext(platform::JsonView response, const Value& added, bool logged);
+  /// Sets `contextIdentifierURL` from the response's "serverContext" as a copy with the member
+  /// `added` set in it would give; none when the response holds no such object, and then nothing is
+  /// added. With `logged`, writes the context to the log first.
+  void takeServerContext(platform::JsonView response, std::optional<platform::JsonEntry> added, bool logged);
 
  private:
   std::optional<std::string> contextIdentifierURL_;

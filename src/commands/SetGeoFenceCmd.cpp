@@ -105,7 +105,7 @@ std::shared_ptr<AXKynGeoFence> SetGeoFenceCmd::result() {
     handle = handles.empty() ? std::nullopt : std::optional(std::move(handles.back()));
   }
 
-  takeServerContext(response, Value(), /*logged=*/false);
+  takeServerContext(response, std::nullopt, /*logged=*/false);
 
   auto geoFence = std::make_shared<AXKynGeoFence>();
   geoFence->trigger = trigger;

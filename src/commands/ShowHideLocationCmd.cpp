@@ -36,8 +36,11 @@ std::shared_ptr<ShowHideLocationResult> ShowHideLocationCmd::result() {
 
   platform::JsonView myInfo = response.member("myInfo");
   if (!myInfo.isObject()) myInfo = {};
-  const auto preferredEmail = platform::stringValue(myInfo.member("preferredEmail"));
-  takeServerContext(response, preferredEmail ? Value{{"preferredEmail", *preferredEmail}} : Value(), /*logged=*/true);
+  const platform::JsonView preferredEmailValue = myInfo.member("preferredEmail");
+  const auto preferredEmail = platform::stringValue(preferredEmailValue);
+  takeServerContext(response,
+                    preferredEmail ? std::optional<platform::JsonEntry>({"preferredEmail", preferredEmailValue}) : std::nullopt,
+                    /*logged=*/true);
   if (log.isEnabled(platform::LogLevel::Default)) {
     log.notice("visibility_response: %@", "(" + platform::toJson(response) + ")");  // the record is not in yet
   }

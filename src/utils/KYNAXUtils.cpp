@@ -96,27 +96,28 @@ Value KYNAXUtils::dictionaryWithAgeStringsForDate(std::optional<Date> date) {
 namespace {
 
 // The textual description of a context value that is not a string.
-std::string describe(const Value& value) {
-  if (value.is_boolean()) return value.get<bool>() ? "1" : "0";
-  if (value.is_number_integer()) {
-    return value.is_number_unsigned() ? std::to_string(value.get<std::uint64_t>())
-                                      : std::to_string(value.get<std::int64_t>());
-  }
-  if (value.is_number_float()) return platform::numberDescription(value.get<double>());
-  if (value.is_null()) return "<null>";
-  return platform::toJson(value);
+std::string describe(platform::JsonView value) {
+  if (value.isBool()) return *platform::boolValue(value) ? "1" : "0";
+  if (value.isNumber() && !value.isInteger()) return platform::numberDescription(*platform::numberValue(value));
+  if (value.isNull()) return "<null>";
+  return platform::toJson(value);  // integers, arrays and objects
 }
 
 }  // namespace
 
-std::optional<std::string> KYNAXUtils::contextIdentifierURLForDictionary(const Value* dictionary) {
-  if (dictionary == nullptr || !dictionary->is_object()) return std::nullopt;
+std::optional<std::string> KYNAXUtils::contextIdentifierURLForDictionary(platform::JsonView dictionary) {
+  if (!dictionary.isObject()) return std::nullopt;
+  return contextIdentifierURLForMembers(platform::uniqueMembers(dictionary));
+}
+
+std::string KYNAXUtils::contextIdentifierURLForMembers(std::span<const platform::JsonEntry> members) {
   std::string url(kContextURLPrefix);
-  for (const auto& [key, value] : dictionary->items()) {
+  for (const auto& [key, value] : members) {
     if (key == "authToken") continue;  // the token never goes into the URL
     url += platform::encodeToPercentEscape(key);
     url += '=';
-    url += platform::encodeToPercentEscape(value.is_string() ? value.get_ref<const std::string&>() : describe(value));
+    const auto text = value.string();
+    url += platform::encodeToPercentEscape(text ? *text : describe(value));
     url += '&';
   }
   return url;

@@ -6,6 +6,7 @@
 
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 
@@ -42,7 +43,9 @@ class KYNAXUtils {
 
   /// "kynServerContext://serverContext?" followed by "key=value&" for every entry but "authToken",
   /// both escaped. Nothing for no dictionary (or a value that is no JSON object).
-  [[nodiscard]] static std::optional<std::string> contextIdentifierURLForDictionary(const Value* dictionary);
+  [[nodiscard]] static std::optional<std::string> contextIdentifierURLForDictionary(platform::JsonView dictionary);
+  /// The same for a dictionary's members, in order and each key once (`platform::uniqueMembers`).
+  [[nodiscard]] static std::string contextIdentifierURLForMembers(std::span<const platform::JsonEntry> members);
   /// The way back: numeric values become 32-bit integers, other values strings. Malformed pairs are
   /// skipped; never fails.
   [[nodiscard]] static Value contextDictionaryForURL(std::string_view url);

@@ -566,6 +566,10 @@ bool JsonView::isNumber() const noexcept {
   const char t = typeOf(*this);
   return t == 'l' || t == 'u' || t == 'd';
 }
+bool JsonView::isInteger() const noexcept {
+  const char t = typeOf(*this);
+  return t == 'l' || t == 'u';
+}
 bool JsonView::isString() const noexcept { return typeOf(*this) == '"'; }
 bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
 bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
@@ -673,6 +677,30 @@ JsonView::Iterator& JsonView::Iterator::operator++() noexcept {
     at_ = after(documentOf(container_), object_ ? at_ + 1 : at_);
   }
   return *this;
+}
+
+std::vector<JsonEntry> uniqueMembers(JsonView object) {
+  std::vector<JsonEntry> out;
+  if (!object.isObject()) return out;
+  const std::size_t size = object.size();
+  out.reserve(size);
+  std::unordered_map<std::string_view, std::size_t> keys;  // for large objects only
+  for (const JsonEntry& entry : object) {
+    std::size_t at = out.size();
+    if (size > kIndexThreshold) {
+      at = keys.emplace(entry.key, at).first->second;
+    } else {
+      for (std::size_t m = 0; m < out.size(); ++m) {
+        if (sameText(out[m].key, entry.key)) {
+          at = m;
+          break;
+        }
+      }
+    }
+    if (at == out.size()) out.push_back(entry);
+    else out[at].value = entry.value;
+  }
+  return out;
 }
 
 // ---- Readers ----

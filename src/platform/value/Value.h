@@ -11,6 +11,7 @@
 #include <span>
 #include <string>
 #include <string_view>
+#include <vector>
 
 namespace kyn {
 
@@ -42,6 +43,8 @@ class JsonView {
   [[nodiscard]] bool isNull() const noexcept;
   [[nodiscard]] bool isBool() const noexcept;
   [[nodiscard]] bool isNumber() const noexcept;
+  /// A number written without fraction or exponent.
+  [[nodiscard]] bool isInteger() const noexcept;
   [[nodiscard]] bool isString() const noexcept;
   [[nodiscard]] bool isArray() const noexcept;
   [[nodiscard]] bool isObject() const noexcept;
@@ -102,6 +105,10 @@ struct JsonEntry {
   std::string_view key;
   JsonView value;
 };
+
+/// The members of an object in order, of a repeated key the last value at the position of the first
+/// (as `toValue` keeps them); empty for anything else.
+[[nodiscard]] std::vector<JsonEntry> uniqueMembers(JsonView object);
 
 /// The value when it is a JSON string; nothing for any other type.
 [[nodiscard]] std::optional<std::string> stringValue(JsonView value);
