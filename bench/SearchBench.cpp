@@ -93,7 +93,7 @@ class AnsweringController final : public platform::KYServerInteractionController
   void sendCommand(std::shared_ptr<platform::KYJSONCommand> command, std::function<void()> completion) override {
     command->setCompletionBlock(std::move(completion));
     last.url = command->url().value_or("");
-    last.body = platform::toJson(command->jsonBodyDictionary());
+    last.body = command->jsonBody();
     last.headers.clear();
     const Value headers = command->headers();
     for (const auto& [name, value] : headers.items()) last.headers.push_back(name + ": " + value.get<std::string>());

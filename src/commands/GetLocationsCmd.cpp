@@ -3,9 +3,12 @@
 #include "account/Common.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
+#include "platform/value/Json.h"
 #include "utils/KYNAXUtils.h"
 
+#include <type_traits>
 #include <unordered_map>
+#include <utility>
 
 namespace kyn {
 
@@ -51,15 +54,49 @@ std::optional<Value> GetLocationsCmd::requestedLocationDictionary() const {
   return KYNAXUtils::dictionaryForLocation(requestedLocation);
 }
 
+template <class Sink>
+void GetLocationsCmd::bodyMembers(Sink&& sink) const {
+  if (auto handles = allFriendsHandles()) sink("handles", *handles);
+  if (auto here = currentLocationDictionary()) sink("myLocation", *here);
+  if (auto there = requestedLocationDictionary()) sink("requestedLocation", *there);
+  if (requestedLocationLabel) sink("label", *requestedLocationLabel);
+  if (proximity) sink("proximity", *proximity);
+  if (clientId) sink("serverContext", Value{{"clientId", *clientId}});
+}
+
 Value GetLocationsCmd::jsonBodyDictionary() const {
   Value body = KYNBaseCmd::jsonBodyDictionary();
-  if (auto handles = allFriendsHandles()) body["handles"] = std::move(*handles);
-  if (auto here = currentLocationDictionary()) body["myLocation"] = std::move(*here);
-  if (auto there = requestedLocationDictionary()) body["requestedLocation"] = std::move(*there);
-  if (requestedLocationLabel) body["label"] = *requestedLocationLabel;
-  if (proximity) body["proximity"] = *proximity;
-  if (clientId) body["serverContext"] = Value{{"clientId", *clientId}};
+  bodyMembers([&](const char* key, auto&& value) { body[key] = std::forward<decltype(value)>(value); });
   return body;
+}
+
+std::string GetLocationsCmd::jsonBody() const {
+  // The base's members as text, then this command's after them: the text of the whole dictionary.
+  std::string out = platform::toJson(KYNBaseCmd::jsonBodyDictionary());
+  out.pop_back();  // the closing brace
+  bool first = out.size() == 1;
+  bodyMembers([&](const char* key, const auto& value) {
+    if (!first) out += ',';
+    first = false;
+    out += '"';
+    out += key;  // a plain identifier
+    out += "\":";
+    using T = std::decay_t<decltype(value)>;
+    if constexpr (std::is_same_v<T, std::string>) {
+      platform::appendJsonString(out, value);
+    } else if constexpr (std::is_same_v<T, std::vector<std::string>>) {
+      out += '[';
+      for (std::size_t i = 0; i < value.size(); ++i) {
+        if (i > 0) out += ',';
+        platform::appendJsonString(out, value[i]);
+      }
+      out += ']';
+    } else {
+      out += platform::toJson(value);
+    }
+  });
+  out += '}';
+  return out;
 }
 
 AXArray<AXKynLocation> GetLocationsCmd::result() {

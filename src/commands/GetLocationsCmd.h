@@ -21,6 +21,8 @@ class GetLocationsCmd : public KYNBaseCmd {
   /// "clientContext", then "handles", "myLocation", "requestedLocation", "label", "proximity" and
   /// "serverContext" (with "clientId"), each only when it has a value.
   [[nodiscard]] Value jsonBodyDictionary() const override;
+  /// The same members written as text, without making the dictionary.
+  [[nodiscard]] std::string jsonBody() const override;
 
   /// The friends' assistant locations, decoded from the response; nothing without a response. Sets
   /// `atRequestedLocation` (the "match" of the last entry not skipped) and `contextIdentifierURL`.
@@ -45,6 +47,11 @@ class GetLocationsCmd : public KYNBaseCmd {
   std::optional<std::string> requestedLocationLabel;
   std::optional<bool> atRequestedLocation;
   std::optional<std::string> clientId;
+
+ private:
+  /// Hands each member that follows the base's to `sink(key, value)`, in order.
+  template <class Sink>
+  void bodyMembers(Sink&& sink) const;
 };
 
 }  // namespace kyn

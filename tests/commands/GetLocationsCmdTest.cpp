@@ -27,6 +27,7 @@ TEST_F(GetLocationsCmdTest, TheBodyHoldsItsKeysInOrderAndOnlyThoseWithValues) {
   GetLocationsCmd command;
   EXPECT_EQ(command.url(), "https://kyn.example.test/kytrservice/friends/va/getlocations");
   EXPECT_EQ(command.jsonBodyDictionary().size(), 1u);  // clientContext alone
+  EXPECT_EQ(command.jsonBody(), platform::toJson(command.jsonBodyDictionary()));
   command.friends = std::vector{test::makePerson({"ada@example.com"}, {"(503) 555-0101"}),
                                 test::makePerson({}, {"+44 20 7946 0018"})};
   command.currentLocation = at(45.5, -122.6);
@@ -36,6 +37,7 @@ TEST_F(GetLocationsCmdTest, TheBodyHoldsItsKeysInOrderAndOnlyThoseWithValues) {
   command.clientId = "client-7";
   command.emails = std::vector<std::string>{"never@example.com"};
   Value body = command.jsonBodyDictionary();
+  EXPECT_EQ(command.jsonBody(), platform::toJson(body));  // the text sent is the dictionary's
   EXPECT_EQ(body["myLocation"], *KYNAXUtils::dictionaryForLocation(*command.currentLocation));
   EXPECT_EQ(body["requestedLocation"], *KYNAXUtils::dictionaryForLocation(*command.requestedLocation));
   body.erase("clientContext");

@@ -491,7 +491,7 @@ class CurlServerInteractionController final : public KYServerInteractionControll
       request.refusalDetail = "only https is sent";
     } else {
       try {
-        request.body = toJson(command->jsonBodyDictionary());
+        request.body = command->jsonBody();
         const Value headers = command->headers();  // iterated below: must outlive the loop
         for (const auto& [name, value] : headers.items()) {
           request.headers.push_back(name + ": " + (value.is_string() ? value.get<std::string>() : toJson(value)));

@@ -30,6 +30,8 @@ Value KYJSONCommand::headers() const { return Value::object(); }
 
 Value KYJSONCommand::jsonBodyDictionary() const { return Value::object(); }
 
+std::string KYJSONCommand::jsonBody() const { return toJson(jsonBodyDictionary()); }
+
 std::optional<std::string> KYJSONCommand::url() const {
   if (!host_ || host_->empty()) return std::nullopt;
   return scheme_ + "://" + *host_ + path();

@@ -67,6 +67,8 @@ class KYJSONCommand : public Object {
   [[nodiscard]] virtual Value headers() const;
   /// The JSON object that becomes the request body; empty unless overridden.
   [[nodiscard]] virtual Value jsonBodyDictionary() const;
+  /// The request body as sent: `toJson(jsonBodyDictionary())`, which a command may write directly.
+  [[nodiscard]] virtual std::string jsonBody() const;
   /// scheme://host + path, or nothing without a host.
   [[nodiscard]] std::optional<std::string> url() const;
 
