@@ -23,8 +23,12 @@ std::string Common::defaultCountryCode() {
 std::optional<std::string> Common::completeNumberForPhoneNumber(const std::optional<std::string>& raw) const {
   if (!raw) return std::nullopt;
   // Only leading junk ("Mobile: ", "ext. ") is cut; whatever follows the first phone character is
-  // left to the parser.
-  std::string kept = platform::suffixFromFirstMatch(*raw, isPhoneCharacter).value_or(*raw);
+  // left to the parser. A text that starts with one (the usual case) is kept without a scan; a
+  // first byte of a longer UTF-8 sequence is no phone character as a code point either.
+  const auto first = static_cast<unsigned char>(raw->empty() ? 0 : raw->front());
+  std::string kept = isPhoneCharacter(first)
+                         ? *raw
+                         : platform::suffixFromFirstMatch(*raw, isPhoneCharacter).value_or(*raw);
   if (kept.empty()) return kept;
   if (auto canonical = platform::formatPhoneNumber(kept, defaultCountryCode(), platform::PhoneNumberStyle::Canonical)) {
     return canonical;
