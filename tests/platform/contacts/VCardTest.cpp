@@ -161,6 +161,7 @@ TEST(VCardProperties, ParametersInEveryFormExportersWrite) {
       "TEL;X-X=\"a;b:c\";TYPE=PAGER:5\r\n"        // ';' and ':' inside quotes
       "TEL;X-BROKEN=\"never closed;TYPE=HOME:6\r\n"  // an unclosed quote does not hide the value
       "item1.TEL:7\r\n"
+      "TEL;TYPE=Xfax\":8\r\nTEL;TYPE=\"faxX:9\r\n"  // a quote at one end only is part of the value
       "EMAIL;INTERNET;PREF:a@example.com\r\n"
       "ITEM1.x-ablabel:Cabin\r\n"));
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"home", "1"},
@@ -169,7 +170,9 @@ TEST(VCardProperties, ParametersInEveryFormExportersWrite) {
                                      {"work", "4"},
                                      {"pager", "5"},
                                      {std::nullopt, "6"},
-                                     {"Cabin", "7"}}));
+                                     {"Cabin", "7"},
+                                     {std::nullopt, "8"},
+                                     {std::nullopt, "9"}}));
   EXPECT_EQ(c.emailAddresses, (Labeled{{std::nullopt, "a@example.com"}}));
 }
 
