@@ -51,14 +51,21 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   port_ = std::stoi(line.substr(colon + 1));
 }
 
-std::vector<Json> Sim::requests() const {
+std::vector<Json> Sim::requests() const { return readJsonLines(dir_ / "requests.jsonl"); }
+
+std::vector<Json> readJsonLines(const std::filesystem::path& file) {
   std::vector<Json> out;
-  std::ifstream in(dir_ / "requests.jsonl");
-  std::string line;
-  while (std::getline(in, line)) {
+  std::ifstream in(file);
+  for (std::string line; std::getline(in, line);) {
     if (!line.empty()) out.push_back(Json::parse(line));
   }
   return out;
+}
+
+ProgramResult runHost(const std::filesystem::path& config, std::vector<std::string> args,
+                      const host::SpawnOptions& options) {
+  args.insert(args.begin(), {KYN_CLI_PATH, "--config", config.string()});
+  return runProgram(args, options);
 }
 
 void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile, const Json& extraConfig,

@@ -96,6 +96,13 @@ class Plugin {
   host::PluginLibrary library_;
 };
 
+/// The objects of a file that holds one JSON object a line.
+[[nodiscard]] std::vector<Json> readJsonLines(const std::filesystem::path& file);
+
+/// Runs the command-line host on the configuration directory `config` with these arguments.
+ProgramResult runHost(const std::filesystem::path& config, std::vector<std::string> args,
+                      const host::SpawnOptions& options = {});
+
 /// A search command for friends given by e-mail address or phone number.
 [[nodiscard]] std::string searchFor(const std::vector<std::string>& handles);
 

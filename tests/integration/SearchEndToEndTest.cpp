@@ -115,8 +115,7 @@ TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewH
   EXPECT_EQ(plugin->replyCounts(), (std::vector<int>{1, 1}));
 
   // A new process with the same configuration.
-  const auto cli = runProgram({KYN_CLI_PATH, "--config", configDir.path().string(), "--json", "search", "--friend",
-                               "ada@example.com"});
+  const auto cli = runHost(configDir.path(), {"--json", "search", "--friend", "ada@example.com"});
   EXPECT_EQ(cli.status, 0) << cli.output;
 
   std::vector<std::string> hosts;
@@ -231,30 +230,28 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
 // The command-line host: a name found in the contacts, and an exit status for each kind of failure.
 TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   start();
-  const std::string config = configDir.path().string();
-  const auto found = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada marlowe", "--here",
-                                 "45.5231,-122.6765,30"});
+  const auto found = runHost(configDir.path(), {"search", "--friend", "ada marlowe", "--here", "45.5231,-122.6765,30"});
   EXPECT_EQ(found.status, 0) << found.output;
   EXPECT_NE(found.output.find("Ada Marlowe — Work · 45.51520, -122.67840 · "), std::string::npos) << found.output;
   EXPECT_NE(found.output.find(" away\n"), std::string::npos) << found.output;  // the plug-in's distance text
   EXPECT_EQ(sim->requests().back()["handles"], Json::parse(R"(["ada@example.com"])"));
 
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "Nobody Known"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--here", "95,1"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", (configDir.path() / "missing").string(), "search"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "Nobody Known"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--here", "95,1"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path() / "missing", {"search"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
 
   // Pictures are written as the address book holds them, named after the handle.
   const test::TempDir pictures;
-  const auto withPictures = runProgram({KYN_CLI_PATH, "--config", config, "--pictures", pictures.path().string(),
-                                        "search", "--friend", "ada@example.com", "--friend", "+15035550102"});
+  const auto withPictures = runHost(configDir.path(), {"--pictures", pictures.path().string(), "search", "--friend",
+                                                        "ada@example.com", "--friend", "+15035550102"});
   EXPECT_EQ(withPictures.status, 0) << withPictures.output;
   std::ifstream picture(pictures.path() / "ada@example.com.pnm", std::ios::binary);
   EXPECT_EQ(std::string(std::istreambuf_iterator<char>(picture), {}), kAdaPicture);
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(pictures.path()), {}), 1);  // Bram has none
 
   std::filesystem::remove(configDir.path() / "account.json");
-  const auto german = runProgram({KYN_CLI_PATH, "--config", config, "--language", "de", "search", "--friend", "ada@example.com"});
+  const auto german = runHost(configDir.path(), {"--language", "de", "search", "--friend", "ada@example.com"});
   EXPECT_EQ(german.status, 1);
   EXPECT_EQ(german.output, "Du bist nicht bei Kyn angemeldet, oder der Server hat die Anmeldung nicht angenommen.\n");
 }
@@ -262,18 +259,17 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
 // Signing in through the host: the token is read from the input, stored owner-only and never shown.
 TEST_F(SearchEndToEnd, TheHostSignsInAndOut) {
   start();
-  const std::string config = configDir.path().string();
   std::filesystem::remove(configDir.path() / "token");
   host::SpawnOptions input;
   input.input = std::string(kToken) + "\n";
-  ASSERT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "account", "login", "--person-id", kPersonId, "--username",
-                        "sam@example.com", "--host", "localhost:" + std::to_string(sim->port())}, input).status, 0);
-  const auto shown = runProgram({KYN_CLI_PATH, "--config", config, "account", "show"});
+  ASSERT_EQ(runHost(configDir.path(), {"account", "login", "--person-id", kPersonId, "--username", "sam@example.com",
+                                       "--host", "localhost:" + std::to_string(sim->port())}, input).status, 0);
+  const auto shown = runHost(configDir.path(), {"account", "show"});
   EXPECT_EQ(shown.status, 0);
   EXPECT_EQ(shown.output.find(kToken), std::string::npos);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 0);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "account", "logout"}).status, 0);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 1);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "ada@example.com"}).status, 0);
+  EXPECT_EQ(runHost(configDir.path(), {"account", "logout"}).status, 0);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "ada@example.com"}).status, 1);
 }
 
 }  // namespace

@@ -3,9 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <fstream>
-#include <sstream>
-
 namespace kyn::platform {
 namespace {
 
@@ -113,10 +110,7 @@ TEST(Json, OutsideCorpus) {
   for (const auto& entry : std::filesystem::directory_iterator(*dir)) {
     const std::string name = entry.path().filename().string();
     if (entry.path().extension() != ".json") continue;
-    std::ifstream in(entry.path(), std::ios::binary);
-    std::stringstream buffer;
-    buffer << in.rdbuf();
-    const auto parsed = parseJson(buffer.str());
+    const auto parsed = parseJson(test::readFile(entry.path()));
     ++files;
     if (name.starts_with("y_")) {
       EXPECT_TRUE(parsed) << name;

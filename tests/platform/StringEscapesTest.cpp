@@ -73,9 +73,7 @@ TEST(Numeric, DescriptionsReadBackAsTheSameNumber) {
   EXPECT_EQ(numberDescription(3.5), "3.5");
   EXPECT_EQ(numberDescription(0.1), "0.1");
   EXPECT_EQ(numberDescription(1e20), "1e+20");
-  for (double d : {1.0 / 3.0, 123456.789, -2.2250738585072014e-308}) {
-    EXPECT_EQ(std::stod(numberDescription(d)), d);
-  }
+  for (double d : {1.0 / 3.0, 123456.789, -2.2250738585072014e-308}) EXPECT_EQ(std::stod(numberDescription(d)), d);
 }
 
 TEST(Utf8, Validation) {

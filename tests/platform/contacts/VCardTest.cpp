@@ -164,15 +164,8 @@ TEST(VCardProperties, ParametersInEveryFormExportersWrite) {
       "TEL;TYPE=Xfax\":8\r\nTEL;TYPE=\"faxX:9\r\n"  // a quote at one end only is part of the value
       "EMAIL;INTERNET;PREF:a@example.com\r\n"
       "ITEM1.x-ablabel:Cabin\r\n"));
-  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home", "1"},
-                                     {"work fax", "2"},
-                                     {"mobile", "3"},
-                                     {"work", "4"},
-                                     {"pager", "5"},
-                                     {std::nullopt, "6"},
-                                     {"Cabin", "7"},
-                                     {std::nullopt, "8"},
-                                     {std::nullopt, "9"}}));
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home", "1"}, {"work fax", "2"}, {"mobile", "3"}, {"work", "4"}, {"pager", "5"},
+                                     {std::nullopt, "6"}, {"Cabin", "7"}, {std::nullopt, "8"}, {std::nullopt, "9"}}));
   EXPECT_EQ(c.emailAddresses, (Labeled{{std::nullopt, "a@example.com"}}));
 }
 
@@ -183,11 +176,7 @@ TEST(VCardProperties, LabelsFromTypesAndFromGroupLabels) {
       "item2.X-ABDATE:2001-06-02\r\nitem2.X-ABLabel:_$!<Anniversary>!$_\r\n"
       "item3.X-ABLabel:My Label\r\nitem3.URL:https://example.org\r\n"  // the label may come first
       "item4.URL;TYPE=HOME:https://example.net\r\n"));                 // a group without label
-  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home fax", "1"},
-                                     {"fax", "2"},
-                                     {"main", "3"},
-                                     {"other", "4"},
-                                     {std::nullopt, "5"},
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"home fax", "1"}, {"fax", "2"}, {"main", "3"}, {"other", "4"}, {std::nullopt, "5"},
                                      {"mobile", "6"}}));
   EXPECT_EQ(c.dates, (Labeled{{"Anniversary", "2001-06-02"}}));
   EXPECT_EQ(c.urlAddresses, (Labeled{{"My Label", "https://example.org"}, {"home", "https://example.net"}}));
@@ -247,10 +236,8 @@ TEST(VCardProperties, EveryFieldOfAContact) {
   EXPECT_EQ(c.emailAddresses, (Labeled{{"work", "alice@example.com"}, {std::nullopt, "alice@example.org"}}));
   EXPECT_EQ(c.dates, (Labeled{{"anniversary", "2010-05-01"}, {"anniversary", "2011-05-01"}}));
   EXPECT_EQ(c.relations, (Labeled{{"spouse", "urn:uuid:1234"}, {std::nullopt, "Bob"}, {"spouse", "Carol"}}));
-  EXPECT_EQ(c.instantMessageAddresses, (Labeled{{"home", "xmpp:alice@example.com"},
-                                                {std::nullopt, "alice.aim"},
-                                                {std::nullopt, "alice@example.net"},
-                                                {std::nullopt, "12345"},
+  EXPECT_EQ(c.instantMessageAddresses, (Labeled{{"home", "xmpp:alice@example.com"}, {std::nullopt, "alice.aim"},
+                                                {std::nullopt, "alice@example.net"}, {std::nullopt, "12345"},
                                                 {std::nullopt, "alice@example.org"}}));
   EXPECT_EQ(c.socialProfiles, (Labeled{{"chirper", "https://social.example.com/alice"}}));
   EXPECT_FALSE(c.imageData);
@@ -278,10 +265,8 @@ TEST(VCardProperties, TelUrisLoseTheSchemeAndKeepTheirExtension) {
                                   "TEL:tel:+1-503-555-0108;ext=%E9\r\n"  // escapes that make no UTF-8
                                   "TEL: (503) 555-0107 \r\n",
                                   "4.0"));
-  EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"},
-                                     {std::nullopt, "+1-503-555-0105"},
-                                     {std::nullopt, "+1 503 555 0106"},
-                                     {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
+  EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"}, {std::nullopt, "+1-503-555-0105"},
+                                     {std::nullopt, "+1 503 555 0106"}, {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
                                      {std::nullopt, "(503) 555-0107"}}));
 }
 
