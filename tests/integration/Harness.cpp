@@ -9,10 +9,7 @@ namespace {
 
 void writeFile(const std::filesystem::path& path, const std::string& text, unsigned mode) {
   std::filesystem::create_directories(path.parent_path());
-  {
-    std::ofstream out(path, std::ios::binary | std::ios::trunc);
-    out << text;
-  }
+  std::ofstream(path, std::ios::binary | std::ios::trunc) << text;  // closed at the end of the statement
   std::filesystem::permissions(path, static_cast<std::filesystem::perms>(mode));
 }
 
@@ -26,11 +23,9 @@ std::optional<Json> parse(const std::optional<std::string>& text) {
 Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std::string> extraArgs) : dir_(dir) {
   writeFile(dir_ / "sim-token", kToken, 0600);
   writeFile(dir_ / "friends.json", dataSet.dump(2), 0644);
-  std::vector<std::string> args = {KYN_SIM_PATH,          "--port",         "0",
-                                   "--person",            kPersonId,        "--token-file",
-                                   (dir_ / "sim-token"),  "--data",         (dir_ / "friends.json"),
-                                   "--ca-out",            (dir_ / "ca.pem"), "--log-file",
-                                   (dir_ / "requests.jsonl")};
+  std::vector<std::string> args = {KYN_SIM_PATH, "--port", "0", "--person", kPersonId, "--token-file", dir_ / "sim-token",
+                                   "--data", dir_ / "friends.json", "--ca-out", dir_ / "ca.pem",
+                                   "--log-file", dir_ / "requests.jsonl"};
   args.insert(args.end(), extraArgs.begin(), extraArgs.end());
   // The server must not outlive the test, even one that crashes.
   host::SpawnOptions options;

@@ -8,19 +8,13 @@
 namespace kyn::itest {
 namespace {
 
-const Json kFriends = Json::parse(R"({
-  "friends": {
-    "ada@example.com": {"location": {"latitude": 45.5152, "longitude": -122.6784, "horizontalAccuracy": 65.0,
-                                     "labels": [{"label": "Work"}],
-                                     "address": {"locality": "Portland", "stateCode": "OR"}},
-                        "ageSeconds": 300},
-    "+15035550102": {"location": {"latitude": 43.6532, "longitude": -79.3832, "horizontalAccuracy": 20.0,
-                                  "address": {"locality": "Toronto", "stateCode": "ON"}},
-                     "ageSeconds": 4000},
-    "chloe@example.org": {"pending": true}
-  },
-  "serverContext": {"minCallbackIntervalInMS": 5000}
-})");
+const Json kFriends = Json::parse(R"({"friends": {
+    "ada@example.com": {"ageSeconds": 300, "location": {"latitude": 45.5152, "longitude": -122.6784,
+        "horizontalAccuracy": 65.0, "labels": [{"label": "Work"}], "address": {"locality": "Portland", "stateCode": "OR"}}},
+    "+15035550102": {"ageSeconds": 4000, "location": {"latitude": 43.6532, "longitude": -79.3832,
+        "horizontalAccuracy": 20.0, "address": {"locality": "Toronto", "stateCode": "ON"}}},
+    "chloe@example.org": {"pending": true}},
+  "serverContext": {"minCallbackIntervalInMS": 5000}})");
 
 // Ada's card carries a 2x1 grey picture.
 const char* kAdaPicture = "P5\n2 1\n255\n\x10\xF0";

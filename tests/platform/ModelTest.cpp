@@ -1,5 +1,6 @@
 #include "platform/assistant/Model.h"
 #include "platform/value/Json.h"
+#include "support/Fakes.h"
 
 #include <gtest/gtest.h>
 
@@ -14,10 +15,7 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
   EXPECT_EQ(AXCommandFailed::commandFailedWithReason("Need at least emails or current location")->dictionary(),
             Value::parse(R"({"class":"AXCommandFailed","reason":"Need at least emails or current location"})"));
 
-  auto person = std::make_shared<AXPerson>();
-  person->fullName = "Ada Lovelace";
-  person->emails = std::vector{std::make_shared<AXEmail>()};
-  person->emails->front()->emailAddress = "ada@example.test";
+  auto person = test::makePerson({"ada@example.test"}, {}, "Ada Lovelace");
   auto attribute = std::make_shared<AXPersonAttribute>();
   attribute->object = person;
   attribute->data = "ada@example.test";
