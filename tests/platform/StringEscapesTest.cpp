@@ -54,14 +54,11 @@ TEST(Numeric, WholeTextMustBeOneNumber) {
 }
 
 TEST(Numeric, LeadingIntegerSaturates) {
-  EXPECT_EQ(leadingInteger32("9999999999"), 2147483647);
-  EXPECT_EQ(leadingInteger32("-9999999999"), -2147483648);
-  EXPECT_EQ(leadingInteger32("2147483647"), 2147483647);
-  EXPECT_EQ(leadingInteger32("-2147483648"), -2147483648);
-  EXPECT_EQ(leadingInteger32("3.99"), 3);
-  EXPECT_EQ(leadingInteger32(" \t\n\v\f\r-12abc"), -12);  // the blanks strtol skips
-  EXPECT_EQ(leadingInteger32("1e5"), 1);
-  EXPECT_EQ(leadingInteger32("abc"), 0);
+  // Between the blanks strtol skips and the first character that is no digit.
+  const std::pair<const char*, std::int32_t> cases[] = {
+      {"9999999999", INT32_MAX}, {"-9999999999", INT32_MIN}, {"2147483647", INT32_MAX}, {"-2147483648", INT32_MIN},
+      {"3.99", 3}, {" \t\n\v\f\r-12abc", -12}, {"1e5", 1}, {"abc", 0}};
+  for (const auto& [text, value] : cases) EXPECT_EQ(leadingInteger32(text), value) << text;
   EXPECT_EQ(leadingInteger64("-9223372036854775808"), INT64_MIN);
   EXPECT_EQ(leadingInteger64("99999999999999999999"), INT64_MAX);
   EXPECT_EQ(leadingInteger64("9223372036854775806"), INT64_MAX - 1);  // one below the cut
