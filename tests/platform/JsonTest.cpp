@@ -73,16 +73,12 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
   const auto document = parseJsonDocument(text);
   ASSERT_TRUE(document);
   for (const JsonView v : {JsonView(&tree), document->root()}) {
-    EXPECT_EQ(integerValue(v.member("s")), 12);  // a repeated key: the last value
-    EXPECT_EQ(integerValue(v.member("n")), 7);
-    EXPECT_EQ(integerValue(v.member("neg")), -3);
-    EXPECT_EQ(integerValue(v.member("i")), -5);
-    EXPECT_EQ(integerValue(v.member("b")), 1);
-    EXPECT_EQ(integerValue(v.member("null")), 0);
-    EXPECT_EQ(integerValue(v.member("missing")), 0);
-    EXPECT_EQ(integerValue(v.member("big")), INT64_MAX);
-    EXPECT_EQ(integerValue(v.member("edge")), INT64_MAX);  // 2^63 itself does not fit either
-    EXPECT_EQ(integerValue(v.member("u")), INT64_MAX);
+    // "s" is there twice: the last value counts; 2^63 ("edge") itself does not fit either.
+    for (const auto& [key, integer] : {std::pair<const char*, std::int64_t>{"s", 12}, {"n", 7}, {"neg", -3}, {"i", -5},
+                                       {"b", 1}, {"null", 0}, {"missing", 0}, {"big", INT64_MAX}, {"edge", INT64_MAX},
+                                       {"u", INT64_MAX}}) {
+      EXPECT_EQ(integerValue(v.member(key)), integer) << key;
+    }
     EXPECT_EQ(int32Value(v.member("u")), -1);
     EXPECT_TRUE(v.member("null").isNull());
     EXPECT_FALSE(v.memberNotNull("null"));
