@@ -52,7 +52,6 @@ struct Account {
   /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
   void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
              const Json& extraConfig = Json::object(), const char* personId = kPersonId, const char* token = kToken) const;
-  /// Adds a vCard file to the address book.
   void addCard(const std::string& fileName, const std::string& card) const;
   std::filesystem::path dir;
 };
@@ -83,7 +82,6 @@ class Plugin {
   [[nodiscard]] std::vector<int> replyCounts();
 
   [[nodiscard]] std::vector<std::string> logLines() const;
-  /// Every entry point of the plug-in.
   [[nodiscard]] host::PluginLibrary& library() noexcept { return library_; }
 
  private:

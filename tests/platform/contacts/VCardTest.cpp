@@ -217,12 +217,16 @@ TEST(VCardProperties, EveryFieldOfAContact) {
       "IMPP;TYPE=home:xmpp:alice@example.com\r\nX-AIM:alice.aim\r\nX-JABBER:alice@example.net\r\n"
       "X-ICQ:12345\r\nX-MS-IMADDRESS:alice@example.org\r\n"
       "X-SOCIALPROFILE;TYPE=chirper:https://social.example.com/alice\r\n"
-      "X-UNKNOWN:ignored\r\nCATEGORIES:a,b\r\n"));
+      "X-UNKNOWN:ignored\r\nCATEGORIES:a,b\r\nORG:Acme\r\n"
+      "FN:Second\r\nN:Two;Other;Wrong\r\nORG:Other;Dept\r\n"));  // the first value of a single-valued field wins
   EXPECT_EQ(c.identifier, "alice-1");
   EXPECT_EQ(c.contactType, ContactType::Person);
   EXPECT_EQ(c.formattedName, "Dr. Alice Q. Example");
+  EXPECT_EQ(c.familyName, "Example");
+  EXPECT_EQ(c.givenName, "Alice");
   EXPECT_EQ(c.middleName, "Quinn");
   EXPECT_FALSE(c.nameSuffix);  // empty components stay absent
+  EXPECT_EQ(c.organizationName, "Acme");
   EXPECT_EQ(c.nickname, "Al");
   EXPECT_EQ(c.previousFamilyName, "Sample");
   EXPECT_EQ(c.phoneticGivenName, "A-lis");
@@ -238,16 +242,7 @@ TEST(VCardProperties, EveryFieldOfAContact) {
                                                 {std::nullopt, "alice@example.net"}, {std::nullopt, "12345"},
                                                 {std::nullopt, "alice@example.org"}}));
   EXPECT_EQ(c.socialProfiles, (Labeled{{"chirper", "https://social.example.com/alice"}}));
-  EXPECT_FALSE(c.imageData);
-}
-
-TEST(VCardProperties, FirstValueOfASingleValuedFieldWins) {
-  const Contact c = parseOne(test::vcard("FN:First\r\nFN:Second\r\nN:One;Given\r\nN:Two;Other\r\nORG:A\r\nORG:B;Dept\r\n"));
-  EXPECT_EQ(c.formattedName, "First");
-  EXPECT_EQ(c.familyName, "One");
-  EXPECT_EQ(c.givenName, "Given");
-  EXPECT_EQ(c.organizationName, "A");
-  EXPECT_FALSE(c.departmentName);
+  EXPECT_FALSE(c.departmentName || c.imageData);
 }
 
 TEST(VCardProperties, OrganisationsByKindOrShowAs) {
