@@ -65,7 +65,7 @@ TEST_F(VCardContactStoreTest, AMissingBookIsEmptyAndNoError) {
 
 TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   const std::string photo = "PHOTO;ENCODING=b:/9j/4A==\r\n";
-  book.write("1.vcf", test::vcard("UID:u-1\r\nN:Example;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
+  book.write("1.vcf", test::vcard("UID:u-1\r\nN:;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
                            photo));
   book.write("2.vcf", test::vcard("UID:other\r\nFN:Someone Else\r\n"));
   book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
@@ -78,8 +78,8 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
                                                               "note", "nickname", "nameSuffix", "phoneticMiddleName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
-  EXPECT_EQ(ann->familyName, "Example");  // the first card's value
-  EXPECT_EQ(ann->givenName, "Ann");
+  EXPECT_EQ(ann->givenName, "Ann");  // the first card's value
+  EXPECT_EQ(ann->familyName, "Other");  // the first card has none
   EXPECT_EQ(ann->jobTitle, "Pilot");  // only the later card has these
   EXPECT_EQ(ann->previousFamilyName, "Sample");
   EXPECT_EQ(ann->note, "n");

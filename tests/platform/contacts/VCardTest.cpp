@@ -218,7 +218,7 @@ TEST(VCardProperties, EveryFieldOfAContact) {
       "X-ICQ:12345\r\nX-MS-IMADDRESS:alice@example.org\r\n"
       "X-SOCIALPROFILE;TYPE=chirper:https://social.example.com/alice\r\n"
       "X-UNKNOWN:ignored\r\nCATEGORIES:a,b\r\nORG:Acme\r\n"
-      "FN:Second\r\nN:Two;Other;Wrong\r\nORG:Other;Dept\r\n"));  // the first value of a single-valued field wins
+      "FN:Second\r\nN:Two;Other;Wrong;Mr.;Jr.\r\nORG:Other;Dept\r\n"));  // the first value of a single-valued field wins
   EXPECT_EQ(c.identifier, "alice-1");
   EXPECT_EQ(c.contactType, ContactType::Person);
   EXPECT_EQ(c.formattedName, "Dr. Alice Q. Example");
@@ -243,6 +243,7 @@ TEST(VCardProperties, EveryFieldOfAContact) {
                                                 {std::nullopt, "alice@example.org"}}));
   EXPECT_EQ(c.socialProfiles, (Labeled{{"chirper", "https://social.example.com/alice"}}));
   EXPECT_FALSE(c.departmentName || c.imageData);
+  EXPECT_FALSE(parseOne(test::vcard("N:;;;Dr.;\r\nN:Later\r\n")).familyName);  // a title alone makes the first N
 }
 
 TEST(VCardProperties, OrganisationsByKindOrShowAs) {
