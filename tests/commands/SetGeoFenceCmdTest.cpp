@@ -41,15 +41,13 @@ TEST_F(SetGeoFenceCmdTest, TheBodyCarriesEveryKeyInItsOrder) {
   EXPECT_EQ(body, Value::parse(R"({"emails":["+15035550101","ada@example.com"],"requestedLocation":45.5152,
       "label":"Office","isOn":"true","address":"1 Example Way\nPORTLAND, OR 97204","trigger":"immediate",
       "onetimeonly":"true","fullAddress":{"streetAddress":"1 Example Way","streetName":"Example Way",
-      "locality":"Portland","stateCode":"OR","country":"US",
-      "formattedAddressLines":["1 Example Way\nPORTLAND, OR 97204"]},
+      "locality":"Portland","stateCode":"OR","country":"US","formattedAddressLines":["1 Example Way\nPORTLAND, OR 97204"]},
       "locationType":"4","type":"NotifyMe"})"));
 }
 
 TEST_F(SetGeoFenceCmdTest, PlacesWithLessAddressAndTheOtherValues) {
   struct Row {
-    std::optional<std::string> street, thoroughfare;
-    std::optional<std::string> trigger, fenceType;
+    std::optional<std::string> street, thoroughfare, trigger, fenceType;
     const char* sentTrigger;
   };
   const Row rows[] = {

@@ -80,12 +80,8 @@ void Account::addCard(const std::string& fileName, const std::string& card) cons
 }
 
 Plugin::Plugin(bool captureLog) : library_(KYN_PLUGIN_PATH) {
-  if (captureLog) {
-    library_.setLogLevel("debug");
-    library_.setLogCallback(&Plugin::onLog, this);
-  } else {
-    library_.setLogLevel("off");
-  }
+  library_.setLogLevel(captureLog ? "debug" : "off");
+  if (captureLog) library_.setLogCallback(&Plugin::onLog, this);
 }
 
 Plugin::~Plugin() = default;

@@ -60,10 +60,8 @@ TEST(Model, CommandsReadBackFromTheirDictionary) {
 }
 
 TEST(Model, ValuesOfTheWrongTypeAreLeftAbsent) {
-  auto search = AXKynSearch::fromDictionary(Value::parse(R"({
-    "friends":[{"emails":"not-an-array","firstName":7}, 42, null],
-    "currentLocation":"here","proximity":{"near":true},
-    "requestedLocation":{"latitude":"48.85","longitude":1e308}})"));
+  auto search = AXKynSearch::fromDictionary(Value::parse(R"({"friends":[{"emails":"not-an-array","firstName":7}, 42, null],
+    "currentLocation":"here","proximity":{"near":true},"requestedLocation":{"latitude":"48.85","longitude":1e308}})"));
   ASSERT_TRUE(search->friends);
   ASSERT_EQ(search->friends->size(), 1u);  // non-objects skipped
   EXPECT_FALSE(search->friends->at(0)->emails);

@@ -28,10 +28,8 @@ class VCardContactStoreTest : public test::PlatformTest {
   Contacts byPhone(VCardContactStore& store, std::string_view phone) {
     return store.unifiedContactsMatchingPhoneNumber(phone, kAllKeys, nullptr);
   }
-  std::size_t logLinesContaining(std::string_view text) const {
-    const auto lines = logMessages();
-    return static_cast<std::size_t>(
-        std::count_if(lines.begin(), lines.end(), [&](const std::string& line) { return line.find(text) != std::string::npos; }));
+  std::ptrdiff_t logLinesContaining(std::string_view text) const {
+    return std::ranges::count_if(logMessages(), [&](const std::string& line) { return line.find(text) != std::string::npos; });
   }
 
   test::TempDir book;
@@ -172,9 +170,9 @@ TEST_F(VCardContactStoreTest, BadFilesAndCardsAreLoggedOnceAndTheRestStillWorks)
   // One error for each file, naming it; card contents never reach the log.
   EXPECT_EQ(log->messages(LogLevel::Error).size(), 4u);
   for (const char* file : {"junk.vcf", "big.vcf", "dangling.vcf", "good.vcf: the card that begins on line 6"}) {
-    EXPECT_EQ(logLinesContaining(file), 1u) << file;
+    EXPECT_EQ(logLinesContaining(file), 1) << file;
   }
-  EXPECT_EQ(logLinesContaining("Secret"), 0u);
+  EXPECT_EQ(logLinesContaining("Secret"), 0);
 }
 
 TEST_F(VCardContactStoreTest, ConcurrentFirstLookUpsAllSeeTheLoadedBook) {
