@@ -187,10 +187,10 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
   account.addCard("ada.vcf", kAdaCard);
   const double threeDaysAgo = std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count() -
                               978'307'200.0 - 3 * 86'400.0;
-  Json location = {{"class", "AXKynLocation"}, {"city", "Paris"}, {"stateCode", "IDF"}, {"locationDate", threeDaysAgo},
-                   {"friend", {{"class", "AXPersonAttribute"},
-                               {"object", {{"class", "AXPerson"}, {"emails", {{{"emailAddress", "ada@example.com"}}}}}}}},
-                   {"latitude", 45.5152}, {"longitude", -122.6784}};
+  Json location = Json::parse(R"({"class":"AXKynLocation","city":"Paris","stateCode":"IDF","latitude":45.5152,
+      "longitude":-122.6784,"friend":{"class":"AXPersonAttribute","object":{"class":"AXPerson",
+      "emails":[{"emailAddress":"ada@example.com"}]}}})");
+  location["locationDate"] = threeDaysAgo;
   for (int load = 0; load < 2; ++load) {
     SCOPED_TRACE("load " + std::to_string(load));
     Plugin plugin;

@@ -14,9 +14,8 @@ class KYNAXLocationTest : public test::PlatformTest {
     const Value entry = Value::parse(json);
     return KYNAXLocation::locationWithHandle(handle, std::make_shared<AXPerson>(), &entry);
   }
-  static std::shared_ptr<KYNAXLocation> withFriend(std::vector<std::optional<std::string>> emails,
-                                                   std::vector<std::optional<std::string>> phones,
-                                                   std::optional<std::string> fullName = std::nullopt) {
+  using Texts = std::vector<std::optional<std::string>>;
+  static std::shared_ptr<KYNAXLocation> withFriend(Texts emails, Texts phones, std::optional<std::string> fullName = {}) {
     return KYNAXLocation::locationWithHandle("h", test::makePerson(std::move(emails), std::move(phones), std::move(fullName)),
                                              nullptr);
   }
