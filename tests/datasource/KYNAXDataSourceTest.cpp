@@ -137,8 +137,11 @@ TEST_F(KYNAXDataSourceTest, TheServerCommandsAreFilledFromTheAssistantsCommands)
   EXPECT_FALSE(set->enable);  // absent is off
   EXPECT_EQ(set->fenceType, AXKynFenceTypeNotifyMeValue);
   fence.enable = true;
+  fence.oneTimeOnly.reset();
   KYNAXDataSource::dataSource().setGeoFence(fence, [](const Value&) {});
-  EXPECT_TRUE(std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back())->enable);
+  const auto again = std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back());
+  EXPECT_TRUE(again->enable);
+  EXPECT_FALSE(again->onetimeonly);  // absent is a fence that stays
   for (const auto& command : controller->sent()) test::completeCommand(command, {});
 }
 

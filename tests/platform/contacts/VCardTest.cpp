@@ -188,7 +188,7 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
       "URL:http\\://example.com/a\\,b\r\n"
       "ORG:Acme\\; Sons;Research;Lab 2\r\n"
       "ADR;TYPE=HOME:PO 7;Apt 3;12 Elm St\\nBack door;Springfield;OR;97400;Testland\r\n"
-      "ADR:;;;Lakeview;;;\r\n"
+      "ADR:;;;Lakeview\r\n"  // trailing empty components left out
       "ADR:;;;;;;\r\n"
       "ADR:;;1 Main St;;;;;Extra;More\r\n"));
   EXPECT_EQ(c.familyName, "O;Neil");
