@@ -160,7 +160,7 @@ TEST(VCardProperties, ParametersInEveryFormExportersWrite) {
       "TEL;X-X=\"a;b:c\";TYPE=PAGER:5\r\n"        // ';' and ':' inside quotes
       "TEL;X-BROKEN=\"never closed;TYPE=HOME:6\r\n"  // an unclosed quote does not hide the value
       "item1.TEL:7\r\n"
-      "TEL;TYPE=Xfax\":8\r\nTEL;TYPE=\"faxX:9\r\n"  // a quote at one end only is part of the value
+      "TEL;TYPE=Xfax\":8\r\nTEL;TYPE=\"faxX:9\r\n"  // a quote at one end only stays in the value
       "EMAIL;INTERNET;PREF:a@example.com\r\n"
       "ITEM1.x-ablabel:Cabin\r\n"));
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"home", "1"}, {"work fax", "2"}, {"mobile", "3"}, {"work", "4"}, {"pager", "5"},
