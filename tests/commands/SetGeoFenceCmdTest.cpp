@@ -8,18 +8,9 @@ class SetGeoFenceCmdTest : public test::PlatformTest {
  protected:
   /// Ada's office: a full address and a coordinate.
   static std::shared_ptr<AXLocation> office() {
-    auto place = std::make_shared<AXLocation>();
-    place->label = "Office";
-    place->street = "1 Example Way";
-    place->thoroughfare = "Example Way";
-    place->city = "Portland";
-    place->stateCode = "OR";
-    place->postalCode = "97204";
-    place->countryCode = "US";
-    place->latitude = 45.5152;
-    place->longitude = -122.6784;
-    place->accuracy = 65.0;
-    return place;
+    return AXLocation::fromDictionary(Value::parse(R"({"label":"Office","street":"1 Example Way",
+        "thoroughfare":"Example Way","city":"Portland","stateCode":"OR","postalCode":"97204","countryCode":"US",
+        "latitude":45.5152,"longitude":-122.6784,"accuracy":65.0})"));
   }
   static std::shared_ptr<SetGeoFenceCmd> fenceFor(std::shared_ptr<AXLocation> place, bool enable) {
     auto command = std::make_shared<SetGeoFenceCmd>();
@@ -50,15 +41,13 @@ TEST_F(SetGeoFenceCmdTest, TheBodyCarriesEveryKeyInItsOrder) {
   EXPECT_EQ(body, Value::parse(R"({"emails":["+15035550101","ada@example.com"],"requestedLocation":45.5152,
       "label":"Office","isOn":"true","address":"1 Example Way\nPORTLAND, OR 97204","trigger":"immediate",
       "onetimeonly":"true","fullAddress":{"streetAddress":"1 Example Way","streetName":"Example Way",
-      "locality":"Portland","stateCode":"OR","country":"US",
-      "formattedAddressLines":["1 Example Way\nPORTLAND, OR 97204"]},
+      "locality":"Portland","stateCode":"OR","country":"US","formattedAddressLines":["1 Example Way\nPORTLAND, OR 97204"]},
       "locationType":"4","type":"NotifyMe"})"));
 }
 
 TEST_F(SetGeoFenceCmdTest, PlacesWithLessAddressAndTheOtherValues) {
   struct Row {
-    std::optional<std::string> street, thoroughfare;
-    std::optional<std::string> trigger, fenceType;
+    std::optional<std::string> street, thoroughfare, trigger, fenceType;
     const char* sentTrigger;
   };
   const Row rows[] = {

@@ -18,14 +18,14 @@ ContactRef contactWith(std::string id, bool picture, bool thumbnail = false) {
 
 TEST(OptimalContact, PrefersTheFirstWithAFullPicture) {
   using V = std::vector<ContactRef>;
-  const V fromThird{contactWith("a", false), contactWith("b", false, true), contactWith("c", true), contactWith("d", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&fromThird)->identifier, "c");
-  const V none{contactWith("a", false), contactWith("b", false, true), contactWith("c", false)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&none)->identifier, "a");
-  const V second{contactWith("a", false), contactWith("b", true)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&second)->identifier, "b");
-  const V single{contactWith("a", false)};
-  EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&single)->identifier, "a");
+  const std::pair<V, const char*> cases[] = {
+      {{contactWith("a", false), contactWith("b", false, true), contactWith("c", true), contactWith("d", true)}, "c"},
+      {{contactWith("a", false), contactWith("b", false, true), contactWith("c", false)}, "a"},  // none has one
+      {{contactWith("a", false), contactWith("b", true)}, "b"},
+      {{contactWith("a", false)}, "a"}};
+  for (const auto& [contacts, id] : cases) {
+    EXPECT_EQ(ContactsUtilities::findOptimalContactInContacts(&contacts)->identifier, id) << contacts.size();
+  }
   const V empty;
   EXPECT_FALSE(ContactsUtilities::findOptimalContactInContacts(&empty));
   EXPECT_FALSE(ContactsUtilities::findOptimalContactInContacts(nullptr));

@@ -105,16 +105,9 @@ TEST_F(KYNAXDataSourceTest, ACompletedReplyCarriesTheResultAndTheContext) {
 }
 
 TEST_F(KYNAXDataSourceTest, TheServerCommandsAreFilledFromTheAssistantsCommands) {
-  AXKynSearch find;
-  find.currentLocation = std::make_shared<AXLocation>();
-  find.currentLocation->latitude = 45.5;
-  find.currentLocation->longitude = -122.6;
-  find.requestedLocation = std::make_shared<AXLocation>();
-  find.requestedLocation->latitude = 45.6;
-  find.requestedLocation->longitude = -122.7;
-  find.requestedLocation->label = "Work";
-  find.friends = std::vector{std::make_shared<AXPerson>()};
-  find.proximity = "at";
+  AXKynSearch find = *AXKynSearch::fromDictionary(Value::parse(R"({"friends":[{}],"proximity":"at",
+      "currentLocation":{"latitude":45.5,"longitude":-122.6},
+      "requestedLocation":{"latitude":45.6,"longitude":-122.7,"label":"Work"}})"));
   KYNAXDataSource::dataSource().search(find, [](const Value&) {});
   auto located = std::dynamic_pointer_cast<GetLocationsCmd>(controller->sent().back());
   EXPECT_EQ(located->currentLocation->coordinate.latitude, 45.5);
@@ -131,13 +124,9 @@ TEST_F(KYNAXDataSourceTest, TheServerCommandsAreFilledFromTheAssistantsCommands)
     EXPECT_EQ(std::dynamic_pointer_cast<ShowHideLocationCmd>(controller->sent().back())->hideLocation, !visible);
   }
 
-  AXKynGeoFenceSet fence;
-  fence.friend_ = test::makePerson({"ada@example.com"}, {});
-  fence.requestedLocation = std::make_shared<AXLocation>();
-  fence.requestedLocation->label = "Work";
-  fence.geoFenceTrigger = std::string(AXKynGeoFenceTriggerOnDepartureValue);
-  fence.oneTimeOnly = true;
-  fence.fenceType = std::string(AXKynFenceTypeNotifyMeValue);
+  AXKynGeoFenceSet fence = *AXKynGeoFenceSet::fromDictionary(Value::parse(R"({"requestedLocation":{"label":"Work"},
+      "friend":{"emails":[{"emailAddress":"ada@example.com"}]},"geoFenceTrigger":"OnDeparture","oneTimeOnly":true,
+      "fenceType":"Me"})"));
   KYNAXDataSource::dataSource().setGeoFence(fence, [](const Value&) {});
   auto set = std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back());
   EXPECT_EQ(set->axPerson, fence.friend_);
@@ -148,8 +137,11 @@ TEST_F(KYNAXDataSourceTest, TheServerCommandsAreFilledFromTheAssistantsCommands)
   EXPECT_FALSE(set->enable);  // absent is off
   EXPECT_EQ(set->fenceType, AXKynFenceTypeNotifyMeValue);
   fence.enable = true;
+  fence.oneTimeOnly.reset();
   KYNAXDataSource::dataSource().setGeoFence(fence, [](const Value&) {});
-  EXPECT_TRUE(std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back())->enable);
+  const auto again = std::dynamic_pointer_cast<SetGeoFenceCmd>(controller->sent().back());
+  EXPECT_TRUE(again->enable);
+  EXPECT_FALSE(again->onetimeonly);  // absent is a fence that stays
   for (const auto& command : controller->sent()) test::completeCommand(command, {});
 }
 

@@ -9,10 +9,7 @@ namespace {
 
 void writeFile(const std::filesystem::path& path, const std::string& text, unsigned mode) {
   std::filesystem::create_directories(path.parent_path());
-  {
-    std::ofstream out(path, std::ios::binary | std::ios::trunc);
-    out << text;
-  }
+  std::ofstream(path, std::ios::binary | std::ios::trunc) << text;  // closed at the end of the statement
   std::filesystem::permissions(path, static_cast<std::filesystem::perms>(mode));
 }
 
@@ -26,11 +23,9 @@ std::optional<Json> parse(const std::optional<std::string>& text) {
 Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std::string> extraArgs) : dir_(dir) {
   writeFile(dir_ / "sim-token", kToken, 0600);
   writeFile(dir_ / "friends.json", dataSet.dump(2), 0644);
-  std::vector<std::string> args = {KYN_SIM_PATH,          "--port",         "0",
-                                   "--person",            kPersonId,        "--token-file",
-                                   (dir_ / "sim-token"),  "--data",         (dir_ / "friends.json"),
-                                   "--ca-out",            (dir_ / "ca.pem"), "--log-file",
-                                   (dir_ / "requests.jsonl")};
+  std::vector<std::string> args = {KYN_SIM_PATH, "--port", "0", "--person", kPersonId, "--token-file", dir_ / "sim-token",
+                                   "--data", dir_ / "friends.json", "--ca-out", dir_ / "ca.pem",
+                                   "--log-file", dir_ / "requests.jsonl"};
   args.insert(args.end(), extraArgs.begin(), extraArgs.end());
   // The server must not outlive the test, even one that crashes.
   host::SpawnOptions options;
@@ -51,14 +46,21 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   port_ = std::stoi(line.substr(colon + 1));
 }
 
-std::vector<Json> Sim::requests() const {
+std::vector<Json> Sim::requests() const { return readJsonLines(dir_ / "requests.jsonl"); }
+
+std::vector<Json> readJsonLines(const std::filesystem::path& file) {
   std::vector<Json> out;
-  std::ifstream in(dir_ / "requests.jsonl");
-  std::string line;
-  while (std::getline(in, line)) {
+  std::ifstream in(file);
+  for (std::string line; std::getline(in, line);) {
     if (!line.empty()) out.push_back(Json::parse(line));
   }
   return out;
+}
+
+ProgramResult runHost(const std::filesystem::path& config, std::vector<std::string> args,
+                      const host::SpawnOptions& options) {
+  args.insert(args.begin(), {KYN_CLI_PATH, "--config", config.string()});
+  return runProgram(args, options);
 }
 
 void Account::write(const std::string& host, const std::optional<std::filesystem::path>& caFile, const Json& extraConfig,
@@ -78,12 +80,8 @@ void Account::addCard(const std::string& fileName, const std::string& card) cons
 }
 
 Plugin::Plugin(bool captureLog) : library_(KYN_PLUGIN_PATH) {
-  if (captureLog) {
-    library_.setLogLevel("debug");
-    library_.setLogCallback(&Plugin::onLog, this);
-  } else {
-    library_.setLogLevel("off");
-  }
+  library_.setLogLevel(captureLog ? "debug" : "off");
+  if (captureLog) library_.setLogCallback(&Plugin::onLog, this);
 }
 
 Plugin::~Plugin() = default;

@@ -52,7 +52,6 @@ struct Account {
   /// Writes account.json naming `host`, the token file and config.json (trusting `caFile` when given).
   void write(const std::string& host, const std::optional<std::filesystem::path>& caFile,
              const Json& extraConfig = Json::object(), const char* personId = kPersonId, const char* token = kToken) const;
-  /// Adds a vCard file to the address book.
   void addCard(const std::string& fileName, const std::string& card) const;
   std::filesystem::path dir;
 };
@@ -83,7 +82,6 @@ class Plugin {
   [[nodiscard]] std::vector<int> replyCounts();
 
   [[nodiscard]] std::vector<std::string> logLines() const;
-  /// Every entry point of the plug-in.
   [[nodiscard]] host::PluginLibrary& library() noexcept { return library_; }
 
  private:
@@ -95,6 +93,13 @@ class Plugin {
   // Last, so that it is unloaded first: shutting down may still deliver replies and log lines.
   host::PluginLibrary library_;
 };
+
+/// The objects of a file that holds one JSON object a line.
+[[nodiscard]] std::vector<Json> readJsonLines(const std::filesystem::path& file);
+
+/// Runs the command-line host on the configuration directory `config` with these arguments.
+ProgramResult runHost(const std::filesystem::path& config, std::vector<std::string> args,
+                      const host::SpawnOptions& options = {});
 
 /// A search command for friends given by e-mail address or phone number.
 [[nodiscard]] std::string searchFor(const std::vector<std::string>& handles);

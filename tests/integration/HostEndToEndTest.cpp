@@ -5,8 +5,6 @@
 
 #include <gtest/gtest.h>
 
-#include <fstream>
-
 namespace kyn::itest {
 namespace {
 
@@ -23,28 +21,14 @@ const char* kAdaCard =
     "BEGIN:VCARD\r\nVERSION:3.0\r\nUID:ada-1\r\nFN:Ada Marlowe\r\nN:Marlowe;Ada;;;\r\n"
     "EMAIL:ada@example.com\r\nEND:VCARD\r\n";
 
-std::vector<Json> linesOf(const std::filesystem::path& file) {
-  std::vector<Json> out;
-  std::ifstream in(file);
-  for (std::string line; std::getline(in, line);) {
-    if (!line.empty()) out.push_back(Json::parse(line));
-  }
-  return out;
-}
-
 TEST(GeoFenceEndToEnd, ANotificationIsSetFiresAndIsSwitchedOff) {
   test::TempDir simDir, configDir;
   const auto control = simDir.path() / "control.json", notifications = simDir.path() / "notifications.jsonl";
-  Sim sim(simDir.path(), kWorld,
-          {"--control-file", control.string(), "--notifications-file", notifications.string()});
+  Sim sim(simDir.path(), kWorld, {"--control-file", control.string(), "--notifications-file", notifications.string()});
   Account account(configDir.path());
   account.write("localhost:" + std::to_string(sim.port()), sim.caFile());
   account.addCard("ada.vcf", kAdaCard);
-  const std::string config = configDir.path().string();
-  auto notify = [&](std::vector<std::string> args) {
-    args.insert(args.begin(), {KYN_CLI_PATH, "--config", config});
-    return runProgram(args);
-  };
+  auto notify = [&](std::vector<std::string> args) { return runHost(configDir.path(), std::move(args)); };
   auto move = [&](const char* lat, const char* lon) {
     EXPECT_EQ(runProgram({KYN_SIM_PATH, "move", "--control", control.string(), "ada@example.com", lat, lon}).status, 0);
   };
@@ -53,7 +37,7 @@ TEST(GeoFenceEndToEnd, ANotificationIsSetFiresAndIsSwitchedOff) {
   EXPECT_EQ(set.status, 0);
   EXPECT_EQ(set.output, "I'll tell you when Ada Marlowe arrives at Work.\n");
   move("45.5232", "-122.6766");
-  auto sent = linesOf(notifications);
+  auto sent = readJsonLines(notifications);
   ASSERT_EQ(sent.size(), 1u);
   EXPECT_EQ(sent[0]["about"], "ada@example.com");
   EXPECT_EQ(sent[0]["to"], Json::array({"sam@example.com"}));
@@ -65,7 +49,7 @@ TEST(GeoFenceEndToEnd, ANotificationIsSetFiresAndIsSwitchedOff) {
   EXPECT_EQ(off.output, "Ich sage dir nicht mehr Bescheid, wenn Ada Marlowe bei „Work“ ankommt.\n");
   move("45.5152", "-122.6784");
   move("45.5232", "-122.6766");
-  EXPECT_EQ(linesOf(notifications).size(), 1u) << "a fence switched off fired";
+  EXPECT_EQ(readJsonLines(notifications).size(), 1u) << "a fence switched off fired";
 
   // A place the server cannot find fails (exit status 1); an address the host cannot read is a usage error.
   const auto unknown = notify({"notify", "--friend", "Ada", "--leaves", "--address", "9 Nowhere Road, Atlantis"});
@@ -80,31 +64,29 @@ TEST(VisibilityEndToEnd, AFriendStopsSeeingTheLocationUntilItIsShownAgain) {
       simDir.path(), kWorld,
       std::vector<std::string>{"--account", std::string(kAdaPerson) + ":" + simDir.write("ada-token", kAdaToken).string()});
   Account(configDir.path()).write("localhost:" + std::to_string(sim->port()), sim->caFile());
-  const std::string sam = configDir.path().string();
   const test::TempDir adaDir;
   Account(adaDir.path())
       .write("localhost:" + std::to_string(sim->port()), sim->caFile(), Json::object(), kAdaPerson, kAdaToken);
   // Where Ada sees Sam: his latitude, or nothing while he hides.
   auto samSeenByAda = [&]() -> Json {
-    const auto seen = runProgram({KYN_CLI_PATH, "--config", adaDir.path().string(), "--json", "search", "--friend",
-                                  "sam@example.com"});
+    const auto seen = runHost(adaDir.path(), {"--json", "search", "--friend", "sam@example.com"});
     EXPECT_EQ(seen.status, 0) << seen.output;
     const Json reply = Json::parse(seen.output, nullptr, false);
     return reply.is_object() ? reply["kynLocations"][0].value("latitude", Json()) : Json();
   };
   EXPECT_EQ(samSeenByAda(), 45.5231);
 
-  const auto hidden = runProgram({KYN_CLI_PATH, "--config", sam, "visibility", "hide"});
+  const auto hidden = runHost(configDir.path(), {"visibility", "hide"});
   EXPECT_EQ(hidden.status, 0);
   EXPECT_EQ(hidden.output, "Your location is now hidden from your friends.\n");
   EXPECT_EQ(samSeenByAda(), Json());
 
-  const auto shown = runProgram({KYN_CLI_PATH, "--config", sam, "--language", "fr", "visibility", "show"});
+  const auto shown = runHost(configDir.path(), {"--language", "fr", "visibility", "show"});
   EXPECT_EQ(shown.status, 0);
   EXPECT_EQ(shown.output, "Vos amis peuvent de nouveau voir votre position.\n");
   EXPECT_EQ(samSeenByAda(), 45.5231);
 
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", sam, "visibility", "sideways"}).status, 2);  // not taken as "hide"
+  EXPECT_EQ(runHost(configDir.path(), {"visibility", "sideways"}).status, 2);  // not taken as "hide"
 }
 
 }  // namespace

@@ -8,19 +8,13 @@
 namespace kyn::itest {
 namespace {
 
-const Json kFriends = Json::parse(R"({
-  "friends": {
-    "ada@example.com": {"location": {"latitude": 45.5152, "longitude": -122.6784, "horizontalAccuracy": 65.0,
-                                     "labels": [{"label": "Work"}],
-                                     "address": {"locality": "Portland", "stateCode": "OR"}},
-                        "ageSeconds": 300},
-    "+15035550102": {"location": {"latitude": 43.6532, "longitude": -79.3832, "horizontalAccuracy": 20.0,
-                                  "address": {"locality": "Toronto", "stateCode": "ON"}},
-                     "ageSeconds": 4000},
-    "chloe@example.org": {"pending": true}
-  },
-  "serverContext": {"minCallbackIntervalInMS": 5000}
-})");
+const Json kFriends = Json::parse(R"({"friends": {
+    "ada@example.com": {"ageSeconds": 300, "location": {"latitude": 45.5152, "longitude": -122.6784,
+        "horizontalAccuracy": 65.0, "labels": [{"label": "Work"}], "address": {"locality": "Portland", "stateCode": "OR"}}},
+    "+15035550102": {"ageSeconds": 4000, "location": {"latitude": 43.6532, "longitude": -79.3832,
+        "horizontalAccuracy": 20.0, "address": {"locality": "Toronto", "stateCode": "ON"}}},
+    "chloe@example.org": {"pending": true}},
+  "serverContext": {"minCallbackIntervalInMS": 5000}})");
 
 // Ada's card carries a 2x1 grey picture.
 const char* kAdaPicture = "P5\n2 1\n255\n\x10\xF0";
@@ -105,18 +99,16 @@ TEST_F(SearchEndToEnd, EveryFailedExchangeIsServiceNotAvailable) {
 
 TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewHost) {
   start({"--canonical-host", "127.0.0.1"});
-  const auto first = plugin->performAndWait(searchFor({"ada@example.com"}));
-  ASSERT_TRUE(first);
-  EXPECT_EQ((*first)["class"], "AXKynSearchCompleted") << first->dump();
-  const auto second = plugin->performAndWait(searchFor({"ada@example.com"}));
-  ASSERT_TRUE(second);
-  EXPECT_EQ((*second)["class"], "AXKynSearchCompleted");
+  for (int command = 0; command < 2; ++command) {
+    const auto reply = plugin->performAndWait(searchFor({"ada@example.com"}));
+    ASSERT_TRUE(reply) << command;
+    EXPECT_EQ((*reply)["class"], "AXKynSearchCompleted") << reply->dump();
+  }
   plugin->shutdown();
   EXPECT_EQ(plugin->replyCounts(), (std::vector<int>{1, 1}));
 
   // A new process with the same configuration.
-  const auto cli = runProgram({KYN_CLI_PATH, "--config", configDir.path().string(), "--json", "search", "--friend",
-                               "ada@example.com"});
+  const auto cli = runHost(configDir.path(), {"--json", "search", "--friend", "ada@example.com"});
   EXPECT_EQ(cli.status, 0) << cli.output;
 
   std::vector<std::string> hosts;
@@ -195,10 +187,10 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
   account.addCard("ada.vcf", kAdaCard);
   const double threeDaysAgo = std::chrono::duration<double>(std::chrono::system_clock::now().time_since_epoch()).count() -
                               978'307'200.0 - 3 * 86'400.0;
-  Json location = {{"class", "AXKynLocation"}, {"city", "Paris"}, {"stateCode", "IDF"}, {"locationDate", threeDaysAgo},
-                   {"friend", {{"class", "AXPersonAttribute"},
-                               {"object", {{"class", "AXPerson"}, {"emails", {{{"emailAddress", "ada@example.com"}}}}}}}},
-                   {"latitude", 45.5152}, {"longitude", -122.6784}};
+  Json location = Json::parse(R"({"class":"AXKynLocation","city":"Paris","stateCode":"IDF","latitude":45.5152,
+      "longitude":-122.6784,"friend":{"class":"AXPersonAttribute","object":{"class":"AXPerson",
+      "emails":[{"emailAddress":"ada@example.com"}]}}})");
+  location["locationDate"] = threeDaysAgo;
   for (int load = 0; load < 2; ++load) {
     SCOPED_TRACE("load " + std::to_string(load));
     Plugin plugin;
@@ -231,30 +223,28 @@ TEST(PluginReload, TheSecondLoadWorksLikeTheFirst) {
 // The command-line host: a name found in the contacts, and an exit status for each kind of failure.
 TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   start();
-  const std::string config = configDir.path().string();
-  const auto found = runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada marlowe", "--here",
-                                 "45.5231,-122.6765,30"});
+  const auto found = runHost(configDir.path(), {"search", "--friend", "ada marlowe", "--here", "45.5231,-122.6765,30"});
   EXPECT_EQ(found.status, 0) << found.output;
   EXPECT_NE(found.output.find("Ada Marlowe — Work · 45.51520, -122.67840 · "), std::string::npos) << found.output;
   EXPECT_NE(found.output.find(" away\n"), std::string::npos) << found.output;  // the plug-in's distance text
   EXPECT_EQ(sim->requests().back()["handles"], Json::parse(R"(["ada@example.com"])"));
 
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "Nobody Known"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--here", "95,1"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", (configDir.path() / "missing").string(), "search"}).status, 2);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "Nobody Known"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--here", "95,1"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path() / "missing", {"search"}).status, 2);
+  EXPECT_EQ(runHost(configDir.path(), {"--pictures", (configDir.path() / "missing").string(), "search"}).status, 2);
 
   // Pictures are written as the address book holds them, named after the handle.
   const test::TempDir pictures;
-  const auto withPictures = runProgram({KYN_CLI_PATH, "--config", config, "--pictures", pictures.path().string(),
-                                        "search", "--friend", "ada@example.com", "--friend", "+15035550102"});
+  const auto withPictures = runHost(configDir.path(), {"--pictures", pictures.path().string(), "search", "--friend",
+                                                        "ada@example.com", "--friend", "+15035550102"});
   EXPECT_EQ(withPictures.status, 0) << withPictures.output;
   std::ifstream picture(pictures.path() / "ada@example.com.pnm", std::ios::binary);
   EXPECT_EQ(std::string(std::istreambuf_iterator<char>(picture), {}), kAdaPicture);
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(pictures.path()), {}), 1);  // Bram has none
 
   std::filesystem::remove(configDir.path() / "account.json");
-  const auto german = runProgram({KYN_CLI_PATH, "--config", config, "--language", "de", "search", "--friend", "ada@example.com"});
+  const auto german = runHost(configDir.path(), {"--language", "de", "search", "--friend", "ada@example.com"});
   EXPECT_EQ(german.status, 1);
   EXPECT_EQ(german.output, "Du bist nicht bei Kyn angemeldet, oder der Server hat die Anmeldung nicht angenommen.\n");
 }
@@ -262,18 +252,17 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
 // Signing in through the host: the token is read from the input, stored owner-only and never shown.
 TEST_F(SearchEndToEnd, TheHostSignsInAndOut) {
   start();
-  const std::string config = configDir.path().string();
   std::filesystem::remove(configDir.path() / "token");
   host::SpawnOptions input;
   input.input = std::string(kToken) + "\n";
-  ASSERT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "account", "login", "--person-id", kPersonId, "--username",
-                        "sam@example.com", "--host", "localhost:" + std::to_string(sim->port())}, input).status, 0);
-  const auto shown = runProgram({KYN_CLI_PATH, "--config", config, "account", "show"});
+  ASSERT_EQ(runHost(configDir.path(), {"account", "login", "--person-id", kPersonId, "--username", "sam@example.com",
+                                       "--host", "localhost:" + std::to_string(sim->port())}, input).status, 0);
+  const auto shown = runHost(configDir.path(), {"account", "show"});
   EXPECT_EQ(shown.status, 0);
   EXPECT_EQ(shown.output.find(kToken), std::string::npos);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 0);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "account", "logout"}).status, 0);
-  EXPECT_EQ(runProgram({KYN_CLI_PATH, "--config", config, "search", "--friend", "ada@example.com"}).status, 1);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "ada@example.com"}).status, 0);
+  EXPECT_EQ(runHost(configDir.path(), {"account", "logout"}).status, 0);
+  EXPECT_EQ(runHost(configDir.path(), {"search", "--friend", "ada@example.com"}).status, 1);
 }
 
 }  // namespace

@@ -42,8 +42,7 @@ class Probe final : public platform::KYJSONCommand {
 /// What one exchange ended with, as its completion saw it.
 struct Ended {
   std::shared_ptr<Probe> command;
-  int completions = 0;
-  int redirectNotices = 0;
+  int completions = 0, redirectNotices = 0;
   bool answeredOnCallerThread = false;
 };
 
@@ -190,9 +189,7 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
   struct Box {
     std::mutex mutex;
     std::condition_variable changed;
-    bool performReturned = false;
-    bool replied = false;
-    bool afterReturn = false;
+    bool performReturned = false, replied = false, afterReturn = false;
     std::thread::id thread;
     Json reply;
   };

@@ -14,9 +14,8 @@ class KYNAXLocationTest : public test::PlatformTest {
     const Value entry = Value::parse(json);
     return KYNAXLocation::locationWithHandle(handle, std::make_shared<AXPerson>(), &entry);
   }
-  static std::shared_ptr<KYNAXLocation> withFriend(std::vector<std::optional<std::string>> emails,
-                                                   std::vector<std::optional<std::string>> phones,
-                                                   std::optional<std::string> fullName = std::nullopt) {
+  using Texts = std::vector<std::optional<std::string>>;
+  static std::shared_ptr<KYNAXLocation> withFriend(Texts emails, Texts phones, std::optional<std::string> fullName = {}) {
     return KYNAXLocation::locationWithHandle("h", test::makePerson(std::move(emails), std::move(phones), std::move(fullName)),
                                              nullptr);
   }
@@ -77,22 +76,18 @@ TEST_F(KYNAXLocationTest, EachFieldComesOnlyFromAValueOfItsType) {
 }
 
 TEST_F(KYNAXLocationTest, PlaceTexts) {
-  auto place = [](const char* city, const char* state) {
-    std::string json = R"({"location":{"address":{)";
-    if (city) json += std::string(R"("locality":")") + city + "\"";
-    if (city && state) json += ",";
-    if (state) json += std::string(R"("stateCode":")") + state + "\"";
-    json += "}}}";
-    return decode(json.c_str())->friendLocation(true);
+  const std::pair<const char*, const char*> cases[] = {
+      {R"("address":{"locality":"Paris","stateCode":"Paris"})", "Paris"},
+      {R"("address":{"stateCode":"NY"})", "NY"},
+      {R"("address":{"locality":"Lyon"})", "Lyon"},
+      {R"("address":{"locality":"Portland","stateCode":"OR"})", "Portland, OR"},
+      {R"("address":{"locality":"","stateCode":"OR"})", ", OR"},  // an empty city counts as present
+      {R"("labels":[{"label":""}],"address":{"locality":"Lyon"})", ""},
+      {R"("labels":[{"label":"Home"}],"address":{"locality":"Lyon"})", "Home"},
   };
-  EXPECT_EQ(place("Paris", "Paris"), "Paris");
-  EXPECT_EQ(place(nullptr, "NY"), "NY");
-  EXPECT_EQ(place("Lyon", nullptr), "Lyon");
-  EXPECT_EQ(place("Portland", "OR"), "Portland, OR");
-  EXPECT_EQ(place("", "OR"), ", OR");  // an empty city counts as present
-  EXPECT_EQ(decode(R"({"location":{"labels":[{"label":""}],"address":{"locality":"Lyon"}}})")->friendLocation(true), "");
-  EXPECT_EQ(decode(R"({"location":{"labels":[{"label":"Home"}],"address":{"locality":"Lyon"}}})")->friendLocation(true),
-            "Home");
+  for (const auto& [location, text] : cases) {
+    EXPECT_EQ(decode(("{\"location\":{" + std::string(location) + "}}").c_str())->friendLocation(true), text) << location;
+  }
   assistant->setLanguageCode("de");
   EXPECT_EQ(decode(R"({})")->friendLocation(false), "Wird gesucht …");
 }

@@ -24,9 +24,7 @@ TEST_F(PresentationTest, TimestampsAroundTheTwoMidnights) {
     std::optional<double> date;
     std::optional<std::string> text;
   } cases[] = {
-      {std::nullopt, std::nullopt},
-      {0.0, std::nullopt},
-      {today + 1, "12:00\u202FAM"},
+      {std::nullopt, std::nullopt}, {0.0, std::nullopt}, {today + 1, "12:00\u202FAM"},
       {today, "Yesterday"},  // exactly midnight is already yesterday
       {today - 86'400 + 1, "Yesterday"},
       {today - 86'400, "11/20/26, 12:00\u202FAM"},  // exactly yesterday's midnight is a date
@@ -74,9 +72,7 @@ TEST_F(PresentationTest, PicturesComeFromTheFirstContactWithAFullPicture) {
   byPhone.imageData = phonePicture;
   addressBook->add("e").imageData = idPicture;
 
-  auto encodedOf = [](const std::shared_ptr<const platform::Image>& image) {
-    return image ? image->encoded : nullptr;
-  };
+  auto encodedOf = [](const std::shared_ptr<const platform::Image>& image) { return image ? image->encoded : nullptr; };
   // E-mail contacts come before phone contacts, in order; a thumbnail is no picture.
   const auto person = test::makePerson({"first@example.com", "second@example.com", "third@example.com"},
                                        {"+15035550102"});

@@ -29,7 +29,7 @@ TEST_F(ConfigurationTest, WithoutAFileEverythingHasItsDefault) {
   EXPECT_EQ(errors(), 0u);
 }
 
-TEST_F(ConfigurationTest, EveryFieldIsReadAndRelativePathsStartAtTheDirectory) {
+TEST_F(ConfigurationTest, EveryFieldIsReadRelativePathsStartAtTheDirectoryAndTimeLimitsRoundUp) {
   auto c = withFile(R"({"caFile":"certs/ca.pem","contacts":"/srv/book.vcf","language":"de-CH","connectTimeoutMs":250,
                         "totalTimeoutMs":1500.2,"maxResponseBytes":4096,"maxRedirects":0})");
   EXPECT_EQ(c.transport().caFile, configDir->path() / "certs/ca.pem");
@@ -43,6 +43,9 @@ TEST_F(ConfigurationTest, EveryFieldIsReadAndRelativePathsStartAtTheDirectory) {
   EXPECT_EQ(c.transport().caFile, "/etc/ca.pem");
   EXPECT_EQ(c.contactsPath(), configDir->path() / "book");
   EXPECT_EQ(c.transport().maxRedirects, 50);
+  c = withFile(R"({"connectTimeoutMs": 0, "totalTimeoutMs": 0.4})");  // curl reads 0 ms as no limit at all
+  EXPECT_EQ(c.transport().connectTimeout, milliseconds(1));
+  EXPECT_EQ(c.transport().totalTimeout, milliseconds(1));
   EXPECT_EQ(errors(), 0u);
 }
 
@@ -65,14 +68,6 @@ TEST_F(ConfigurationTest, AFieldOfTheWrongTypeOrOutOfRangeKeepsItsDefaultAndIsLo
   EXPECT_EQ(withFile("[1]").transport().maxRedirects, defaults.maxRedirects);
   EXPECT_EQ(withFile("{\"language\":").contactsPath(), configDir->path() / "contacts");
   EXPECT_EQ(errors(), 12u);
-}
-
-// libcurl reads a time limit of 0 ms as no limit at all.
-TEST_F(ConfigurationTest, TimeLimitsBelowAMillisecondRoundUp) {
-  const auto c = withFile(R"({"connectTimeoutMs": 0, "totalTimeoutMs": 0.4})");
-  EXPECT_EQ(c.transport().connectTimeout, milliseconds(1));
-  EXPECT_EQ(c.transport().totalTimeout, milliseconds(1));
-  EXPECT_EQ(errors(), 0u);
 }
 
 // A host that configures another directory must not keep writing into the first one, nor keep

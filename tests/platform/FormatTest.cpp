@@ -14,16 +14,15 @@ TEST(Format, RendersEachPlaceholderKind) {
   EXPECT_EQ(format("100%% sure"), "100% sure");
   EXPECT_EQ(format("%@", 2.5), "2.5");
   EXPECT_EQ(format("%@", true), "1");
+  EXPECT_EQ(format("%2$@ (%1$@)", "Paris", "IDF"), "IDF (Paris)");  // positions let translations reorder
+  EXPECT_EQ(format("%1$@, %2$@", "Paris", "IDF"), "Paris, IDF");
 }
 
-TEST(Format, AbsentObjectsPrintNull) {
+TEST(Format, AbsentObjectsPrintNullAndObjectsTheirDescription) {
   std::optional<std::string> none;
   std::shared_ptr<AXPerson> nobody;
   const Value* noValue = nullptr;
   EXPECT_EQ(format("%@ %@ %@ %@", none, nobody, noValue, nullptr), "(null) (null) (null) (null)");
-}
-
-TEST(Format, ObjectsPrintTheirDescription) {
   auto person = std::make_shared<AXPerson>();
   person->firstName = "Ada";
   EXPECT_EQ(format("AXPerson found: %@", person), R"(AXPerson found: <AXPerson {"class":"AXPerson","firstName":"Ada"}>)");
@@ -31,11 +30,6 @@ TEST(Format, ObjectsPrintTheirDescription) {
   EXPECT_EQ(format("%@", v), R"({"a":1})");
   std::vector<std::shared_ptr<AXEmail>> list{std::make_shared<AXEmail>(), nullptr};
   EXPECT_EQ(format("%@", list), R"((<AXEmail {"class":"AXEmail"}>, (null)))");
-}
-
-TEST(Format, PositionalArgumentsLetTranslationsReorder) {
-  EXPECT_EQ(format("%1$@, %2$@", "Paris", "IDF"), "Paris, IDF");
-  EXPECT_EQ(format("%2$@ (%1$@)", "Paris", "IDF"), "IDF (Paris)");
 }
 
 TEST(Format, OddFormatsNeitherCrashNorConsumeArguments) {

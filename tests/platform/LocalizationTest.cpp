@@ -35,14 +35,11 @@ TEST(Localization, EveryLanguageHasEveryKeyWithItsPlaceholders) {
 
 TEST(Localization, LanguagesFallBackToTheirParentsThenToEnglish) {
   IcuLocalization strings;
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "en-US"), "Yesterday");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de"), "Gestern");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de-CH"), "Gestern");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "de_AT"), "Gestern");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "fr-CA"), "Hier");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "ja-JP"), "Yesterday");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", ""), "Yesterday");
-  EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", "!!not a tag"), "Yesterday");
+  for (const auto& [language, text] : {std::pair{"en-US", "Yesterday"}, {"de", "Gestern"}, {"de-CH", "Gestern"},
+                                       {"de_AT", "Gestern"}, {"fr-CA", "Hier"}, {"ja-JP", "Yesterday"}, {"", "Yesterday"},
+                                       {"!!not a tag", "Yesterday"}}) {
+    EXPECT_EQ(strings.localizedString("DATE_YESTERDAY", language), text) << language;
+  }
   EXPECT_EQ(strings.localizedString("NO_SUCH_KEY", "de"), "NO_SUCH_KEY");  // a missing key comes back as itself
   EXPECT_EQ(strings.localizedString("", "en"), "");
 }

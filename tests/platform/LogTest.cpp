@@ -5,7 +5,7 @@
 namespace kyn::platform {
 namespace {
 
-TEST(Log, LinesBelowTheMinimumLevelAreDropped) {
+TEST(Log, LinesBelowTheMinimumLevelAreDroppedAndLevelsHaveNames) {
   Log log("s", "c");
   auto sink = std::make_shared<CaptureLogSink>();
   log.setSink(sink);
@@ -23,9 +23,6 @@ TEST(Log, LinesBelowTheMinimumLevelAreDropped) {
   log.setMinimumLevel(LogLevel::Off);
   log.error("silenced");
   EXPECT_EQ(sink->records().size(), 2u);
-}
-
-TEST(Log, LevelNames) {
   EXPECT_EQ(logLevelFromName("error"), LogLevel::Error);
   EXPECT_EQ(logLevelFromName("off"), LogLevel::Off);
   EXPECT_FALSE(logLevelFromName("loud"));

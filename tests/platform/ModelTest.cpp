@@ -1,5 +1,6 @@
 #include "platform/assistant/Model.h"
 #include "platform/value/Json.h"
+#include "support/Fakes.h"
 
 #include <gtest/gtest.h>
 
@@ -14,10 +15,7 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
   EXPECT_EQ(AXCommandFailed::commandFailedWithReason("Need at least emails or current location")->dictionary(),
             Value::parse(R"({"class":"AXCommandFailed","reason":"Need at least emails or current location"})"));
 
-  auto person = std::make_shared<AXPerson>();
-  person->fullName = "Ada Lovelace";
-  person->emails = std::vector{std::make_shared<AXEmail>()};
-  person->emails->front()->emailAddress = "ada@example.test";
+  auto person = test::makePerson({"ada@example.test"}, {}, "Ada Lovelace");
   auto attribute = std::make_shared<AXPersonAttribute>();
   attribute->object = person;
   attribute->data = "ada@example.test";
@@ -30,16 +28,11 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
   reply->kynLocations = std::vector{location};
   reply->atRequestedLocation = false;
   reply->searchContext = "kynServerContext://serverContext?";
-  EXPECT_EQ(reply->dictionary(), Value::parse(R"({
-    "class":"AXKynSearchCompleted",
-    "kynLocations":[{"class":"AXKynLocation",
-      "friend":{"class":"AXPersonAttribute",
-        "object":{"class":"AXPerson","fullName":"Ada Lovelace",
-                  "emails":[{"class":"AXEmail","emailAddress":"ada@example.test"}]},
-        "data":"ada@example.test"},
-      "latitude":37.33,"longitude":0.0}],
-    "atRequestedLocation":false,
-    "searchContext":"kynServerContext://serverContext?"})"));
+  EXPECT_EQ(reply->dictionary(), Value::parse(R"({"class":"AXKynSearchCompleted",
+    "kynLocations":[{"class":"AXKynLocation","friend":{"class":"AXPersonAttribute",
+        "object":{"class":"AXPerson","fullName":"Ada Lovelace","emails":[{"class":"AXEmail","emailAddress":"ada@example.test"}]},
+        "data":"ada@example.test"},"latitude":37.33,"longitude":0.0}],
+    "atRequestedLocation":false,"searchContext":"kynServerContext://serverContext?"})"));
 
   // The host gets the reply as text written from the record: the same text as the dictionary's,
   // escapes, broken UTF-8 and number forms included.
@@ -67,10 +60,8 @@ TEST(Model, CommandsReadBackFromTheirDictionary) {
 }
 
 TEST(Model, ValuesOfTheWrongTypeAreLeftAbsent) {
-  auto search = AXKynSearch::fromDictionary(Value::parse(R"({
-    "friends":[{"emails":"not-an-array","firstName":7}, 42, null],
-    "currentLocation":"here","proximity":{"near":true},
-    "requestedLocation":{"latitude":"48.85","longitude":1e308}})"));
+  auto search = AXKynSearch::fromDictionary(Value::parse(R"({"friends":[{"emails":"not-an-array","firstName":7}, 42, null],
+    "currentLocation":"here","proximity":{"near":true},"requestedLocation":{"latitude":"48.85","longitude":1e308}})"));
   ASSERT_TRUE(search->friends);
   ASSERT_EQ(search->friends->size(), 1u);  // non-objects skipped
   EXPECT_FALSE(search->friends->at(0)->emails);

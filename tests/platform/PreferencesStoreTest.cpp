@@ -74,15 +74,18 @@ TEST_F(PreferencesStoreTest, ACorruptFileReadsAsEmptyAndIsReplacedOnTheNextWrite
 }
 
 TEST_F(PreferencesStoreTest, WritesLeaveNoTemporaryFilesAndKeepTheFilePrivate) {
-  configDir->write("prefs/d.json.Ab12Cd", "{}");
-  std::filesystem::permissions(dir() / "d.json.Ab12Cd", std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);
+  // Owner-only files of the temporaries' name length; only letters and digits make one a temporary.
+  for (const char* name : {"d.json.Ab12Cd", "d.json.ab-cD1"}) {
+    configDir->write(std::string("prefs/") + name, "{}");
+    std::filesystem::permissions(dir() / name, std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);
+  }
   configDir->write("prefs/d.json.notes", "{}");
   configDir->write("prefs/d.json.backup", "{}");
   FilePreferencesStore store(dir());
   store.setValue("d", "k", Value("v"));
   ASSERT_TRUE(store.synchronize("d"));
   // A temporary file that an earlier version left behind goes; the user's own files stay.
-  EXPECT_EQ(namesInDir(), (std::vector<std::string>{"d.json", "d.json.backup", "d.json.notes"}));
+  EXPECT_EQ(namesInDir(), (std::vector<std::string>{"d.json", "d.json.ab-cD1", "d.json.backup", "d.json.notes"}));
   EXPECT_EQ(std::filesystem::status(dir() / "d.json").permissions() &
                 (std::filesystem::perms::group_all | std::filesystem::perms::others_all),
             std::filesystem::perms::none);
@@ -103,8 +106,7 @@ TEST_F(PreferencesStoreTest, AWriterEndedAtAnyMomentLeavesAWholeFileAndNothingEl
     const auto stored = reader.value("d", "value");
     const auto value = stringValue(stored ? &*stored : nullptr);
     ASSERT_TRUE(value && value->size() > 8 && value->starts_with("written-") &&
-                value->find_first_not_of("0123456789", 8) == std::string::npos)
-        << value.value_or("nothing");
+                value->find_first_not_of("0123456789", 8) == std::string::npos) << value.value_or("nothing");
     ASSERT_EQ(reader.value("d", "padding"), Value(std::string(16384, 'p')));
   }
 }

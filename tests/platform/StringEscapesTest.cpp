@@ -8,10 +8,10 @@ namespace kyn::platform {
 namespace {
 
 TEST(PercentEscape, EscapesQuerySyntaxAndKeepsUnreserved) {
-  EXPECT_EQ(encodeToPercentEscape("a&b=c%d"), "a%26b%3Dc%25d");
-  EXPECT_EQ(encodeToPercentEscape("AZaz09-._~"), "AZaz09-._~");
-  EXPECT_EQ(encodeToPercentEscape("a b+c/d?#"), "a%20b%2Bc%2Fd%3F%23");
-  EXPECT_EQ(encodeToPercentEscape("é"), "%C3%A9");
+  for (const auto& [text, escaped] : {std::pair{"a&b=c%d", "a%26b%3Dc%25d"}, {"AZaz09-._~", "AZaz09-._~"},
+                                      {"a b+c/d?#", "a%20b%2Bc%2Fd%3F%23"}, {"é", "%C3%A9"}}) {
+    EXPECT_EQ(encodeToPercentEscape(text), escaped);
+  }
 }
 
 TEST(PercentEscape, DecodeIsTheExactInverse) {
@@ -54,39 +54,32 @@ TEST(Numeric, WholeTextMustBeOneNumber) {
 }
 
 TEST(Numeric, LeadingIntegerSaturates) {
-  EXPECT_EQ(leadingInteger32("9999999999"), 2147483647);
-  EXPECT_EQ(leadingInteger32("-9999999999"), -2147483648);
-  EXPECT_EQ(leadingInteger32("2147483647"), 2147483647);
-  EXPECT_EQ(leadingInteger32("-2147483648"), -2147483648);
-  EXPECT_EQ(leadingInteger32("3.99"), 3);
-  EXPECT_EQ(leadingInteger32(" \t\n\v\f\r-12abc"), -12);  // the blanks strtol skips
-  EXPECT_EQ(leadingInteger32("1e5"), 1);
-  EXPECT_EQ(leadingInteger32("abc"), 0);
+  // Between the blanks strtol skips and the first character that is no digit.
+  const std::pair<const char*, std::int32_t> cases[] = {
+      {"9999999999", INT32_MAX}, {"-9999999999", INT32_MIN}, {"2147483647", INT32_MAX}, {"-2147483648", INT32_MIN},
+      {"3.99", 3}, {" \t\n\v\f\r-12abc", -12}, {"1e5", 1}, {"abc", 0}};
+  for (const auto& [text, value] : cases) EXPECT_EQ(leadingInteger32(text), value) << text;
   EXPECT_EQ(leadingInteger64("-9223372036854775808"), INT64_MIN);
   EXPECT_EQ(leadingInteger64("99999999999999999999"), INT64_MAX);
   EXPECT_EQ(leadingInteger64("9223372036854775806"), INT64_MAX - 1);  // one below the cut
 }
 
 TEST(Numeric, DescriptionsReadBackAsTheSameNumber) {
-  EXPECT_EQ(numberDescription(42.0), "42");
-  EXPECT_EQ(numberDescription(-0.0), "0");
-  EXPECT_EQ(numberDescription(3.5), "3.5");
-  EXPECT_EQ(numberDescription(0.1), "0.1");
-  EXPECT_EQ(numberDescription(1e20), "1e+20");
-  for (double d : {1.0 / 3.0, 123456.789, -2.2250738585072014e-308}) {
-    EXPECT_EQ(std::stod(numberDescription(d)), d);
+  for (const auto& [number, text] : {std::pair{42.0, "42"}, {-0.0, "0"}, {3.5, "3.5"}, {0.1, "0.1"}, {1e20, "1e+20"}}) {
+    EXPECT_EQ(numberDescription(number), text);
   }
+  for (double d : {1.0 / 3.0, 123456.789, -2.2250738585072014e-308}) EXPECT_EQ(std::stod(numberDescription(d)), d);
 }
 
 TEST(Utf8, Validation) {
   EXPECT_TRUE(isValidUtf8("plain é 漢 😀"));
-  EXPECT_FALSE(isValidUtf8("\xC0\xAF"));      // overlong
-  EXPECT_FALSE(isValidUtf8("\xED\xA0\x80"));  // surrogate
-  EXPECT_FALSE(isValidUtf8("\xF4\x90\x80\x80"));  // beyond U+10FFFF
-  EXPECT_FALSE(isValidUtf8("\xE6\xBC"));      // truncated
   // The first and last code point of each length are valid; one below each first is overlong.
   EXPECT_TRUE(isValidUtf8("\xC2\x80 \xDF\xBF \xE0\xA0\x80 \xEF\xBF\xBF \xF0\x90\x80\x80 \xF4\x8F\xBF\xBF"));
-  for (const char* overlong : {"\xC1\xBF", "\xE0\x9F\xBF", "\xF0\x8F\xBF\xBF"}) EXPECT_FALSE(isValidUtf8(overlong));
+  // Overlong forms, a surrogate, a code point beyond U+10FFFF, a truncated character.
+  for (const char* bad :
+       {"\xC0\xAF", "\xC1\xBF", "\xE0\x9F\xBF", "\xF0\x8F\xBF\xBF", "\xED\xA0\x80", "\xF4\x90\x80\x80", "\xE6\xBC"}) {
+    EXPECT_FALSE(isValidUtf8(bad));
+  }
 }
 
 }  // namespace

@@ -122,18 +122,12 @@ TEST(SignInCheck, EachFieldIsCheckedInTurn) {
     SignInProblem problem;
   } cases[] = {
       {good, SignInProblem::None},
-      {{"", "u", "h", "t"}, SignInProblem::PersonId},
-      {{" P-1", "u", "h", "t"}, SignInProblem::PersonId},
-      {{"P-1 ", "u", "h", "t"}, SignInProblem::PersonId},
-      {{"P\x01", "u", "h", "t"}, SignInProblem::PersonId},
-      {{longText, "u", "h", "t"}, SignInProblem::PersonId},
-      {{"P-1", "a\x7f", "h", "t"}, SignInProblem::Username},
-      {{"P-1", "u", "h", "two words"}, SignInProblem::Token},
-      {{"P-1", "u", "h", "tab\there"}, SignInProblem::Token},
-      {{"P-1", "u", "h", ""}, SignInProblem::Token},
-      {{"P-1", "u", "h", std::string(4097, 't')}, SignInProblem::Token},
-      {{"P-1", "u", "h", std::string(4096, 't')}, SignInProblem::None},
-  };
+      {{"", "u", "h", "t"}, SignInProblem::PersonId}, {{" P-1", "u", "h", "t"}, SignInProblem::PersonId},
+      {{"P-1 ", "u", "h", "t"}, SignInProblem::PersonId}, {{"P\x01", "u", "h", "t"}, SignInProblem::PersonId},
+      {{longText, "u", "h", "t"}, SignInProblem::PersonId}, {{"P-1", "a\x7f", "h", "t"}, SignInProblem::Username},
+      {{"P-1", "u", "h", "two words"}, SignInProblem::Token}, {{"P-1", "u", "h", "tab\there"}, SignInProblem::Token},
+      {{"P-1", "u", "h", ""}, SignInProblem::Token}, {{"P-1", "u", "h", std::string(4097, 't')}, SignInProblem::Token},
+      {{"P-1", "u", "h", std::string(4096, 't')}, SignInProblem::None}};
   for (const auto& c : cases) EXPECT_EQ(checkSignIn(c.signIn), c.problem) << c.signIn.personId << c.signIn.token;
 
   for (const char* host : {"kyn.example.test", "a-b.example:65535", "127.0.0.1:1", "[::1]:8443", "[::1]", "x"}) {

@@ -35,8 +35,7 @@ class PluginAgainstSim(unittest.TestCase):
         cls.sim = subprocess.Popen([os.environ["KYN_SIM"], "--person", PERSON, "--token-file", f"{root}/sim/token",
                                     "--data", f"{root}/sim/friends.json", "--ca-out", f"{root}/sim/ca.pem"],
                                    stdout=subprocess.PIPE, stderr=subprocess.DEVNULL, text=True)
-        line = cls.sim.stdout.readline()
-        port = line.rsplit(":", 1)[-1].strip()
+        port = cls.sim.stdout.readline().rsplit(":", 1)[-1].strip()  # "... listening on https://HOST:PORT"
         cls.config = f"{root}/config"
         write(f"{cls.config}/account.json",
               json.dumps({"personId": PERSON, "username": "sam@example.com", "serviceHost": f"localhost:{port}"}))

@@ -29,21 +29,14 @@ class WorldTest : public ::testing::Test {
   }
 
   Json setFence(Json patch, std::size_t account = 0) {
-    Json request = {{"clientContext", {{"locale", "en-US"}}},
-                    {"emails", {"ada@example.com", "+15035550101"}},  // Ada's second handle is no friend's
-                    {"isOn", "true"},
-                    {"address", ""},
-                    {"trigger", "enter"},
-                    {"onetimeonly", "false"},
-                    {"type", "NotifyMe"}};
+    // Ada's second handle is no friend's.
+    Json request = Json::parse(R"({"clientContext":{"locale":"en-US"},"emails":["ada@example.com","+15035550101"],
+        "isOn":"true","address":"","trigger":"enter","onetimeonly":"false","type":"NotifyMe"})");
     request.update(patch);
     return answerGeoFence(world, account, request, kNow);
   }
   static Json at(Coordinate c, double accuracy = 10) {
-    return {{"latitude", c.latitude},
-            {"longitude", c.longitude},
-            {"source", "assistant"},
-            {"horizontalAccuracy", accuracy}};
+    return {{"latitude", c.latitude}, {"longitude", c.longitude}, {"source", "assistant"}, {"horizontalAccuracy", accuracy}};
   }
   Json hide(std::size_t account, const Json& yesNo) {
     return answerShowHideLocation(world, account,

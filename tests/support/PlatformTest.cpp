@@ -10,22 +10,14 @@
 namespace kyn::test {
 
 void PlatformTest::SetUp() {
-  configDir = std::make_unique<TempDir>();
   auto& s = platform::services();
   s.configure(configDir->path());
 
-  log = std::make_shared<platform::CaptureLogSink>();
   previousSink_ = s.log().setSink(log);
   previousLevel_ = s.log().minimumLevel();
   s.log().setMinimumLevel(platform::LogLevel::Debug);
 
-  systemInfo = std::make_shared<FakeSystemInfo>();
   systemInfo->signIn();
-  session = std::make_shared<FakeSession>();
-  clock = std::make_shared<FixedClock>(utcDate(2026, 11, 21, 15, 30, 0));
-  assistant = std::make_shared<platform::AssistantPreferences>("en-US");
-  addressBook = std::make_shared<FakeContactStore>();
-  controller = std::make_shared<FakeController>();
   s.systemInfo.set(systemInfo);
   s.session.set(session);
   s.clock.set(clock);

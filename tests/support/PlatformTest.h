@@ -22,14 +22,14 @@ class PlatformTest : public ::testing::Test {
   /// Every message logged so far.
   [[nodiscard]] std::vector<std::string> logMessages() const { return log->messages(); }
 
-  std::unique_ptr<TempDir> configDir;
-  std::shared_ptr<platform::CaptureLogSink> log;
-  std::shared_ptr<FakeSystemInfo> systemInfo;
-  std::shared_ptr<FakeSession> session;
-  std::shared_ptr<FixedClock> clock;
-  std::shared_ptr<platform::AssistantPreferences> assistant;
-  std::shared_ptr<FakeContactStore> addressBook;
-  std::shared_ptr<FakeController> controller;
+  std::unique_ptr<TempDir> configDir = std::make_unique<TempDir>();
+  std::shared_ptr<platform::CaptureLogSink> log = std::make_shared<platform::CaptureLogSink>();
+  std::shared_ptr<FakeSystemInfo> systemInfo = std::make_shared<FakeSystemInfo>();
+  std::shared_ptr<FakeSession> session = std::make_shared<FakeSession>();
+  std::shared_ptr<FixedClock> clock = std::make_shared<FixedClock>(utcDate(2026, 11, 21, 15, 30, 0));
+  std::shared_ptr<platform::AssistantPreferences> assistant = std::make_shared<platform::AssistantPreferences>("en-US");
+  std::shared_ptr<FakeContactStore> addressBook = std::make_shared<FakeContactStore>();
+  std::shared_ptr<FakeController> controller = std::make_shared<FakeController>();
 
  private:
   std::shared_ptr<platform::LogSink> previousSink_;

@@ -17,18 +17,13 @@ class LocationConversionTest : public test::PlatformTest {
     l->accuracy = accuracy;
     return l;
   }
-  static platform::Location at(double lat, double lon, double accuracy = 10.0,
-                               std::optional<platform::Date> timestamp = std::nullopt) {
-    return test::fix(lat, lon, accuracy, timestamp);
-  }
 };
 
 TEST_F(LocationConversionTest, ZeroOrMissingCoordinatesAreNoLocation) {
   EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(nullptr));
-  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(0.0, 20.0)));
-  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, 0.0)));
-  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(std::nullopt, 20.0)));
-  EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(ax(10.0, std::nullopt)));
+  for (const auto& l : {ax(0.0, 20.0), ax(10.0, 0.0), ax(std::nullopt, 20.0), ax(10.0, std::nullopt)}) {
+    EXPECT_FALSE(KYNAXUtils::coreLocationForAXLocation(l)) << l->dictionary();
+  }
   // There is no range check until the dictionary.
   const auto unchecked = KYNAXUtils::coreLocationForAXLocation(ax(std::nan(""), 20.0));
   ASSERT_TRUE(unchecked);
@@ -49,7 +44,7 @@ TEST_F(LocationConversionTest, AnAssistantLocationBecomesAFixStampedNow) {
 }
 
 TEST_F(LocationConversionTest, TheDictionaryHoldsCoordinateAndSourceInOrder) {
-  const auto d = KYNAXUtils::dictionaryForLocation(at(48.8566, 2.3522, 65.0, 0.5));
+  const auto d = KYNAXUtils::dictionaryForLocation(test::fix(48.8566, 2.3522, 65.0, 0.5));
   ASSERT_TRUE(d);
   EXPECT_EQ(platform::toJson(*d),
             R"({"latitude":48.8566,"longitude":2.3522,"source":"assistant","horizontalAccuracy":65.0,)"
@@ -57,37 +52,29 @@ TEST_F(LocationConversionTest, TheDictionaryHoldsCoordinateAndSourceInOrder) {
 }
 
 TEST_F(LocationConversionTest, OnlyTheLowEightBitsOfTheWholeMetresDecideTheAccuracy) {
-  struct Case {
-    double accuracy;
-    bool sent;
-  };
-  for (const Case c : {Case{65.0, true}, Case{0.4, false}, Case{0.0, false}, Case{1.0, true}, Case{255.9, true},
-                       Case{256.0, false}, Case{256.9, false}, Case{512.3, false}, Case{257.5, true},
-                       Case{-1.0, true}, Case{-256.0, false}, Case{std::nan(""), false}, Case{INFINITY, false},
-                       Case{1e12, false}}) {
-    const auto d = KYNAXUtils::dictionaryForLocation(at(10, 20, c.accuracy));
-    ASSERT_TRUE(d);
-    EXPECT_EQ(d->contains("horizontalAccuracy"), c.sent) << c.accuracy;
-    if (c.sent) {
-      EXPECT_EQ((*d)["horizontalAccuracy"].get<double>(), c.accuracy);
-    }
+  // Sent ones go as they are.
+  for (const double sent : {65.0, 1.0, 255.9, 257.5, -1.0}) {
+    EXPECT_EQ((*KYNAXUtils::dictionaryForLocation(test::fix(10, 20, sent)))["horizontalAccuracy"], sent) << sent;
+  }
+  for (const double dropped : {0.4, 0.0, 256.0, 256.9, 512.3, -256.0, std::nan(""), HUGE_VAL, 1e12}) {
+    EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(test::fix(10, 20, dropped))->contains("horizontalAccuracy")) << dropped;
   }
 }
 
 TEST_F(LocationConversionTest, TimestampsAreMillisecondsSince1970) {
-  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, 0.0))->contains("timestamp"));
-  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, std::nullopt))->contains("timestamp"));
-  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(10, 20, 10, std::nan("")))->contains("timestamp"));
-  const auto d = KYNAXUtils::dictionaryForLocation(at(10, 20, 10, 1.5 - platform::kReferenceDateSince1970));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(test::fix(10, 20, 10, 0.0))->contains("timestamp"));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(test::fix(10, 20, 10, std::nullopt))->contains("timestamp"));
+  EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(test::fix(10, 20, 10, std::nan("")))->contains("timestamp"));
+  const auto d = KYNAXUtils::dictionaryForLocation(test::fix(10, 20, 10, 1.5 - platform::kReferenceDateSince1970));
   EXPECT_EQ((*d)["timestamp"].get<double>(), 1'500.0);
 }
 
 TEST_F(LocationConversionTest, CoordinateValidity) {
   for (auto [lat, lon] : {std::pair{90.0, 180.0}, {-90.0, -180.0}, {0.0, 0.0}}) {
-    EXPECT_TRUE(KYNAXUtils::dictionaryForLocation(at(lat, lon))) << lat << "," << lon;
+    EXPECT_TRUE(KYNAXUtils::dictionaryForLocation(test::fix(lat, lon))) << lat << "," << lon;
   }
   for (auto [lat, lon] : {std::pair{91.0, 0.0}, {0.0, 180.5}, {-90.1, 0.0}, {INFINITY, 0.0}, {0.0, std::nan("")}}) {
-    EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(at(lat, lon))) << lat << "," << lon;
+    EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(test::fix(lat, lon))) << lat << "," << lon;
   }
   EXPECT_FALSE(KYNAXUtils::dictionaryForLocation(std::shared_ptr<const platform::Location>()));
 }

@@ -28,10 +28,8 @@ class VCardContactStoreTest : public test::PlatformTest {
   Contacts byPhone(VCardContactStore& store, std::string_view phone) {
     return store.unifiedContactsMatchingPhoneNumber(phone, kAllKeys, nullptr);
   }
-  std::size_t logLinesContaining(std::string_view text) const {
-    const auto lines = logMessages();
-    return static_cast<std::size_t>(
-        std::count_if(lines.begin(), lines.end(), [&](const std::string& line) { return line.find(text) != std::string::npos; }));
+  std::ptrdiff_t logLinesContaining(std::string_view text) const {
+    return std::ranges::count_if(logMessages(), [&](const std::string& line) { return line.find(text) != std::string::npos; });
   }
 
   test::TempDir book;
@@ -65,7 +63,7 @@ TEST_F(VCardContactStoreTest, AMissingBookIsEmptyAndNoError) {
 
 TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   const std::string photo = "PHOTO;ENCODING=b:/9j/4A==\r\n";
-  book.write("1.vcf", test::vcard("UID:u-1\r\nN:Example;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
+  book.write("1.vcf", test::vcard("UID:u-1\r\nN:;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
                            photo));
   book.write("2.vcf", test::vcard("UID:other\r\nFN:Someone Else\r\n"));
   book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
@@ -78,8 +76,8 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
                                                               "note", "nickname", "nameSuffix", "phoneticMiddleName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
-  EXPECT_EQ(ann->familyName, "Example");  // the first card's value
-  EXPECT_EQ(ann->givenName, "Ann");
+  EXPECT_EQ(ann->givenName, "Ann");  // the first card's value
+  EXPECT_EQ(ann->familyName, "Other");  // the first card has none
   EXPECT_EQ(ann->jobTitle, "Pilot");  // only the later card has these
   EXPECT_EQ(ann->previousFamilyName, "Sample");
   EXPECT_EQ(ann->note, "n");
@@ -172,9 +170,9 @@ TEST_F(VCardContactStoreTest, BadFilesAndCardsAreLoggedOnceAndTheRestStillWorks)
   // One error for each file, naming it; card contents never reach the log.
   EXPECT_EQ(log->messages(LogLevel::Error).size(), 4u);
   for (const char* file : {"junk.vcf", "big.vcf", "dangling.vcf", "good.vcf: the card that begins on line 6"}) {
-    EXPECT_EQ(logLinesContaining(file), 1u) << file;
+    EXPECT_EQ(logLinesContaining(file), 1) << file;
   }
-  EXPECT_EQ(logLinesContaining("Secret"), 0u);
+  EXPECT_EQ(logLinesContaining("Secret"), 0);
 }
 
 TEST_F(VCardContactStoreTest, ConcurrentFirstLookUpsAllSeeTheLoadedBook) {
