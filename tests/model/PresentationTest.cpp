@@ -72,7 +72,9 @@ TEST_F(PresentationTest, PicturesComeFromTheFirstContactWithAFullPicture) {
   byPhone.imageData = phonePicture;
   addressBook->add("e").imageData = idPicture;
 
-  auto encodedOf = [](const std::shared_ptr<const platform::Image>& image) { return image ? image->encoded : nullptr; };
+  auto encodedOf = [](const std::shared_ptr<const platform::Image>& image) {
+    return image ? image->encoded : nullptr;
+  };
   // E-mail contacts come before phone contacts, in order; a thumbnail is no picture.
   const auto person = test::makePerson({"first@example.com", "second@example.com", "third@example.com"},
                                        {"+15035550102"});

@@ -28,11 +28,16 @@ TEST(Model, RepliesHaveTheDocumentedDictionaryLayout) {
   reply->kynLocations = std::vector{location};
   reply->atRequestedLocation = false;
   reply->searchContext = "kynServerContext://serverContext?";
-  EXPECT_EQ(reply->dictionary(), Value::parse(R"({"class":"AXKynSearchCompleted",
-    "kynLocations":[{"class":"AXKynLocation","friend":{"class":"AXPersonAttribute",
-        "object":{"class":"AXPerson","fullName":"Ada Lovelace","emails":[{"class":"AXEmail","emailAddress":"ada@example.test"}]},
-        "data":"ada@example.test"},"latitude":37.33,"longitude":0.0}],
-    "atRequestedLocation":false,"searchContext":"kynServerContext://serverContext?"})"));
+  EXPECT_EQ(reply->dictionary(), Value::parse(R"({
+    "class":"AXKynSearchCompleted",
+    "kynLocations":[{"class":"AXKynLocation",
+      "friend":{"class":"AXPersonAttribute",
+        "object":{"class":"AXPerson","fullName":"Ada Lovelace",
+                  "emails":[{"class":"AXEmail","emailAddress":"ada@example.test"}]},
+        "data":"ada@example.test"},
+      "latitude":37.33,"longitude":0.0}],
+    "atRequestedLocation":false,
+    "searchContext":"kynServerContext://serverContext?"})"));
 
   // The host gets the reply as text written from the record: the same text as the dictionary's,
   // escapes, broken UTF-8 and number forms included.

@@ -55,7 +55,9 @@ TEST(NotificationCenter, NoCallAfterRemovalReturnsWhilePostingFromAnotherThread)
       if (!alive->load()) ++violations;
     });
     std::atomic<bool> stop{false};
-    std::thread poster([&] { while (!stop.load()) center.post({"tick", nullptr}); });
+    std::thread poster([&] {
+      while (!stop.load()) center.post({"tick", nullptr});
+    });
     std::this_thread::yield();
     center.removeObserver(token);
     alive->store(false);  // from here on, a call would be a call after removal
