@@ -14,12 +14,15 @@ class HandlesTest : public test::PlatformTest {
 
 TEST_F(HandlesTest, OnlyLeadingJunkIsCutBeforeParsing) {
   const std::pair<std::optional<std::string>, std::optional<std::string>> cases[] = {
-      {"Mobile: +1 (408) 555-0100", "+14085550100"}, {"(408) 555-0100", "+14085550100"},
-      {"ext. 12", "12"},     // cut, and too short to be a number
-      {"ext. x", "ext. x"},  // nothing to cut, no number
+      {"Mobile: +1 (408) 555-0100", "+14085550100"},
+      {"(408) 555-0100", "+14085550100"},
+      {"ext. 12", "12"},              // cut, and too short to be a number
+      {"ext. x", "ext. x"},           // nothing to cut, no number
       {"Ada Lovelace", "Ada Lovelace"},
       {"tel \u0664\u0660\u0668\u0665\u0665\u0665\u0660\u0661\u0660\u0660", "+14085550100"},
-      {"", ""}, {std::nullopt, std::nullopt}};
+      {"", ""},
+      {std::nullopt, std::nullopt},
+  };
   for (const auto& [raw, completed] : cases) EXPECT_EQ(common.completeNumberForPhoneNumber(raw), completed) << raw.value_or("(none)");
   // Each phone character ends the junk: what stands before it goes, the character stays.
   for (const char* first : {"+", "(", ")", "*", "#", "-"}) {

@@ -24,7 +24,8 @@ class HandlersTest : public test::PlatformTest {
     return out;
   }
   /// Every reply of a perform, each of which must have come before perform returned.
-  template <class Handler> std::vector<Value> perform(Handler& handler) {
+  template <class Handler>
+  std::vector<Value> perform(Handler& handler) {
     std::vector<Value> replies;
     handler.performWithCompletion([&](const Value& r) { replies.push_back(r); });
     return replies;

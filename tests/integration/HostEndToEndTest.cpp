@@ -24,7 +24,8 @@ const char* kAdaCard =
 TEST(GeoFenceEndToEnd, ANotificationIsSetFiresAndIsSwitchedOff) {
   test::TempDir simDir, configDir;
   const auto control = simDir.path() / "control.json", notifications = simDir.path() / "notifications.jsonl";
-  Sim sim(simDir.path(), kWorld, {"--control-file", control.string(), "--notifications-file", notifications.string()});
+  Sim sim(simDir.path(), kWorld,
+          {"--control-file", control.string(), "--notifications-file", notifications.string()});
   Account account(configDir.path());
   account.write("localhost:" + std::to_string(sim.port()), sim.caFile());
   account.addCard("ada.vcf", kAdaCard);

@@ -24,7 +24,9 @@ TEST_F(PresentationTest, TimestampsAroundTheTwoMidnights) {
     std::optional<double> date;
     std::optional<std::string> text;
   } cases[] = {
-      {std::nullopt, std::nullopt}, {0.0, std::nullopt}, {today + 1, "12:00\u202FAM"},
+      {std::nullopt, std::nullopt},
+      {0.0, std::nullopt},
+      {today + 1, "12:00\u202FAM"},
       {today, "Yesterday"},  // exactly midnight is already yesterday
       {today - 86'400 + 1, "Yesterday"},
       {today - 86'400, "11/20/26, 12:00\u202FAM"},  // exactly yesterday's midnight is a date

@@ -79,10 +79,12 @@ TEST_F(DistanceCalculatorTest, APreferenceOverridesTheRegionsUnits) {
     const char* text;
     long measurementSystem;
   } cases[] = {
-      {"uk", "0,77 mi", kMeasurementSystemUK}, {"us", "0,77 mi", kMeasurementSystemUS},
+      {"uk", "0,77 mi", kMeasurementSystemUK},
+      {"us", "0,77 mi", kMeasurementSystemUS},
       {"metric", "1,2 km", kMeasurementSystemMetric},
       {"imperial", "1,2 km", kMeasurementSystemMetric},  // not a value: the region's units
-      {2, "1,2 km", kMeasurementSystemMetric}};
+      {2, "1,2 km", kMeasurementSystemMetric},
+  };
   for (const auto& c : cases) {
     prefs->setValue(kSuite, kMeasurementSystemKey, c.stored);
     const auto calculator = KYDistanceCalculator::initWithDefaultsSuiteName(kSuite, "de", "de_DE");

@@ -106,7 +106,8 @@ TEST_F(PreferencesStoreTest, AWriterEndedAtAnyMomentLeavesAWholeFileAndNothingEl
     const auto stored = reader.value("d", "value");
     const auto value = stringValue(stored ? &*stored : nullptr);
     ASSERT_TRUE(value && value->size() > 8 && value->starts_with("written-") &&
-                value->find_first_not_of("0123456789", 8) == std::string::npos) << value.value_or("nothing");
+                value->find_first_not_of("0123456789", 8) == std::string::npos)
+        << value.value_or("nothing");
     ASSERT_EQ(reader.value("d", "padding"), Value(std::string(16384, 'p')));
   }
 }

@@ -49,17 +49,22 @@ TEST_F(AgeStringsTest, EveryBandAtItsBoundaries) {
     const char* spoken;
   };
   const Case cases[] = {
-      // Each band from its first to its last second.
-      {30, "Now", "Located just now"}, {30.9, "Now", "Located just now"},
+      {30, "Now", "Located just now"},
+      {30.9, "Now", "Located just now"},
       {31, "Over 30 sec ago", "Located more than 30 seconds ago"},
       {59.9, "Over 30 sec ago", "Located more than 30 seconds ago"},
-      {60, "1 min ago", "Located 1 minute ago"}, {119, "1 min ago", "Located 1 minute ago"},
-      {120, "2 min ago", "Located 2 minutes ago"}, {3'599, "59 min ago", "Located 59 minutes ago"},
+      {60, "1 min ago", "Located 1 minute ago"},
+      {119, "1 min ago", "Located 1 minute ago"},
+      {120, "2 min ago", "Located 2 minutes ago"},
+      {3'599, "59 min ago", "Located 59 minutes ago"},
       {3'600, "Over 1 hr ago", "Located more than 1 hour ago"},
       {7'199, "Over 1 hr ago", "Located more than 1 hour ago"},
-      {7'200, "2 hr ago", "Located 2 hours ago"}, {10'799, "2 hr ago", "Located 2 hours ago"},
-      {10'800, "3 hr ago", "Located 3 hours ago"}, {86'400.0 * 3, "72 hr ago", "Located 72 hours ago"},
-      {-90, "1 min ago", "Located 1 minute ago"}};  // the future counts like the past
+      {7'200, "2 hr ago", "Located 2 hours ago"},
+      {10'799, "2 hr ago", "Located 2 hours ago"},
+      {10'800, "3 hr ago", "Located 3 hours ago"},
+      {86'400.0 * 3, "72 hr ago", "Located 72 hours ago"},
+      {-90, "1 min ago", "Located 1 minute ago"},  // the future counts like the past
+  };
   for (const auto& c : cases) {
     const Band band = ageOf(c.secondsAgo);
     EXPECT_EQ(band.display, c.display) << c.secondsAgo;

@@ -130,7 +130,8 @@ TEST(VCardLines, CutOffCardsAreReportedAndTheCardsAroundThemRead) {
 
 TEST(VCardLines, AnEmbeddedAgentCardIsSkippedUpToItsEnd) {
   const Contact c = parseOne(test::vcard("FN:Boss\r\nAGENT:\r\nBEGIN:VCARD\r\nVERSION:2.1\r\nFN:Assistant\r\n"
-                                  "TEL:+1 503 555 0102\r\nEND:VCARD\r\nTEL:+1 503 555 0103\r\n", "2.1"));
+                                  "TEL:+1 503 555 0102\r\nEND:VCARD\r\nTEL:+1 503 555 0103\r\n",
+                                  "2.1"));
   EXPECT_EQ(c.formattedName, "Boss");
   EXPECT_EQ(c.phoneNumbers, (Labeled{{std::nullopt, "+1 503 555 0103"}}));
   const Contact sameLine = parseOne(test::vcard("FN:Boss\r\nAGENT:BEGIN:VCARD\r\nFN:Assistant\r\nEND:VCARD\r\nNOTE:after\r\n"));
@@ -203,7 +204,8 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
   // Address components in label order; empty ones leave no blank lines; an empty address is none;
   // components past the seventh join the country.
   EXPECT_EQ(c.postalAddresses, (Labeled{{"home", "PO 7\nApt 3\n12 Elm St\nBack door\nSpringfield, OR 97400\nTestland"},
-                                        {std::nullopt, "Lakeview"}, {std::nullopt, "1 Main St\nExtra More"}}));
+                                        {std::nullopt, "Lakeview"},
+                                        {std::nullopt, "1 Main St\nExtra More"}}));
 }
 
 TEST(VCardProperties, EveryFieldOfAContact) {
@@ -257,7 +259,8 @@ TEST(VCardProperties, TelUrisLoseTheSchemeAndKeepTheirExtension) {
                                   "TEL;VALUE=uri:TEL:+1-503-555-0105;phone-context=example.com\r\n"
                                   "TEL:tel:+1%20503%20555%200106\r\n"
                                   "TEL:tel:+1-503-555-0108;ext=%E9\r\n"  // escapes that make no UTF-8
-                                  "TEL: (503) 555-0107 \r\n", "4.0"));
+                                  "TEL: (503) 555-0107 \r\n",
+                                  "4.0"));
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"}, {std::nullopt, "+1-503-555-0105"},
                                      {std::nullopt, "+1 503 555 0106"}, {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
                                      {std::nullopt, "(503) 555-0107"}}));
@@ -297,7 +300,8 @@ TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
       "X-MAIDENNAME;CHARSET=US-ASCII:Fran\xE7ois\r\n"               // a false US-ASCII: as if none
       "X-SOCIALPROFILE;TYPE=\xE9t\xE9:https://example.com/p\r\n"      // a parameter is no UTF-8 either
       "NICKNAME;CHARSET=../../../etc/passwd:Pe\xF1" "a\r\n"         // never a file name for ICU
-      "X-PHONETIC-FIRST-NAME;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:=C3=91=80\r\n", "2.1"));
+      "X-PHONETIC-FIRST-NAME;CHARSET=UTF-8;ENCODING=QUOTED-PRINTABLE:=C3=91=80\r\n",
+      "2.1"));
   EXPECT_EQ(c.formattedName, "Jos\xC3\xA9 Garc\xC3\xAD" "a");
   EXPECT_EQ(c.note, "\xE6\x97\xA5\xE6\x9C\xAC");
   EXPECT_EQ(c.familyName, "\xE2\x80\x9CQuoted\xE2\x80\x9D");
@@ -318,7 +322,8 @@ TEST(VCardPictures, Base64InEveryLayout) {
   EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO;ENCODING=b;TYPE=JPEG:" + folded + "\r\n")).imageData), kPicture);
   // 2.1: lines without indentation up to a blank line, then more properties.
   const Contact old = parseOne(test::vcard("PHOTO;ENCODING=BASE64;JPEG:\r\n" + data.substr(0, 8) + "\r\n" + data.substr(8) +
-                                        "\r\n\r\nFN:After Photo\r\n", "2.1"));
+                                        "\r\n\r\nFN:After Photo\r\n",
+                                    "2.1"));
   EXPECT_EQ(bytesOf(old.imageData), kPicture);
   EXPECT_EQ(old.formattedName, "After Photo");
   // 4.0 data: URI, and a writer that left the encoding out.
