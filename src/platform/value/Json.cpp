@@ -237,8 +237,8 @@ bool keepsLimits(const Document& document, std::size_t maxDepth) noexcept {
 }
 
 /// Makes the Value of the document's value at `index`: of duplicate keys the last value at the
-/// position of the first. Each container is made at its final size, so nothing it holds is moved
-/// again; keys are compared and indexed as views into the document.
+/// position of the first (`uniqueMembers`), each value made once. Each container is made at its
+/// final size.
 void convert(const Document& document, std::size_t index, Value& out) {
   switch (typeAt(document, index)) {
     case '[': {
@@ -252,30 +252,9 @@ void convert(const Document& document, std::size_t index, Value& out) {
     case '{': {
       out = Value::object();
       auto& members = static_cast<Value::object_t::Container&>(out.get_ref<Value::object_t&>());
-      const std::size_t size = countAt(document, index);
-      members.reserve(size);
-      std::unordered_map<std::string_view, std::size_t> keys;  // for large objects only
-      if (size > kIndexThreshold) keys.reserve(size);
-      const std::size_t end = closing(document, index);
-      for (std::size_t i = index + 1; i < end; i = after(document, i + 1)) {
-        const std::string_view key = stringAt(document, i);
-        std::size_t at = members.size();
-        if (size > kIndexThreshold) {
-          const auto [it, added] = keys.emplace(key, at);
-          if (!added) at = it->second;
-        } else {
-          for (std::size_t m = 0; m < members.size(); ++m) {
-            if (members[m].first == key) {
-              at = m;
-              break;
-            }
-          }
-        }
-        if (at == members.size()) members.emplace_back(std::string(key), Value());
-        Value& slot = members[at].second;
-        slot = Value();  // a repeated key's value is replaced as a whole
-        convert(document, i + 1, slot);
-      }
+      const std::vector<JsonEntry> unique = uniqueMembers(JsonView::inDocument(&document, index));
+      members.reserve(unique.size());
+      for (const auto& [key, value] : unique) members.emplace_back(std::string(key), value.toValue());
       return;
     }
     case '"': out = Value(std::string(stringAt(document, index))); return;
