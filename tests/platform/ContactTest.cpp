@@ -38,6 +38,16 @@ TEST(ContactProjection, KeepsOnlyWhatTheKeysName) {
   const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
   EXPECT_EQ(fullNameOfContact(named, "en_US"), fullNameOfContact(sample(), "en_US"));
   EXPECT_FALSE(named.note);
+  // A contact that holds nothing the keys drop is shared as it is; one that does is copied without it.
+  const ContactProjection projection({std::string(ContactKey::FullNameFormatterKeys), "note", "imageData",
+                                      "phoneNumbers", "emailAddresses"});
+  const auto whole = std::make_shared<const Contact>(sample());
+  EXPECT_EQ(projection.share(whole), whole);
+  Contact born = sample();
+  born.birthday = "1815-12-10";
+  const auto copied = projection.share(std::make_shared<const Contact>(born));
+  EXPECT_FALSE(copied->birthday);
+  EXPECT_EQ(copied->note, "private");
 }
 
 TEST(ContactFullName, TheCardsOwnNameWins) {

@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <array>
+#include <tuple>
 
 namespace kyn::platform {
 namespace {
@@ -21,82 +22,107 @@ bool familyNameFirst(std::string_view localeId) {
 
 bool present(const std::optional<std::string>& s) { return s && !s->empty(); }
 
+/// One property of a contact: the key that names it (none for the formatted name, which only the
+/// full-name descriptor keeps) and whether the full-name formatter reads it.
+template <typename T>
+struct Field {
+  std::string_view key;
+  T Contact::*member;
+  bool formatter = false;
+};
+using Text = std::optional<std::string>;
+using Labeled = std::vector<LabeledValue>;
+
+// Each property has the bit of its place in this list.
+constexpr auto kFields = std::tuple{
+    Field<ContactType>{ContactKey::ContactType, &Contact::contactType, true},
+    Field<Text>{{}, &Contact::formattedName, true},
+    Field<Text>{ContactKey::NamePrefix, &Contact::namePrefix, true},
+    Field<Text>{ContactKey::GivenName, &Contact::givenName, true},
+    Field<Text>{ContactKey::MiddleName, &Contact::middleName, true},
+    Field<Text>{ContactKey::FamilyName, &Contact::familyName, true},
+    Field<Text>{ContactKey::NameSuffix, &Contact::nameSuffix, true},
+    Field<Text>{ContactKey::OrganizationName, &Contact::organizationName, true},
+    Field<Text>{ContactKey::PreviousFamilyName, &Contact::previousFamilyName},
+    Field<Text>{ContactKey::Nickname, &Contact::nickname},
+    Field<Text>{ContactKey::PhoneticGivenName, &Contact::phoneticGivenName},
+    Field<Text>{ContactKey::PhoneticMiddleName, &Contact::phoneticMiddleName},
+    Field<Text>{ContactKey::PhoneticFamilyName, &Contact::phoneticFamilyName},
+    Field<Text>{ContactKey::DepartmentName, &Contact::departmentName},
+    Field<Text>{ContactKey::JobTitle, &Contact::jobTitle},
+    Field<Text>{ContactKey::Birthday, &Contact::birthday},
+    Field<Text>{ContactKey::Note, &Contact::note},
+    Field<ImageBytes>{ContactKey::ImageData, &Contact::imageData},
+    Field<ImageBytes>{ContactKey::ThumbnailImageData, &Contact::thumbnailImageData},
+    Field<Labeled>{ContactKey::PhoneNumbers, &Contact::phoneNumbers},
+    Field<Labeled>{ContactKey::EmailAddresses, &Contact::emailAddresses},
+    Field<Labeled>{ContactKey::PostalAddresses, &Contact::postalAddresses},
+    Field<Labeled>{ContactKey::Dates, &Contact::dates},
+    Field<Labeled>{ContactKey::UrlAddresses, &Contact::urlAddresses},
+    Field<Labeled>{ContactKey::Relations, &Contact::relations},
+    Field<Labeled>{ContactKey::SocialProfiles, &Contact::socialProfiles},
+    Field<Labeled>{ContactKey::InstantMessageAddresses, &Contact::instantMessageAddresses},
+};
+static_assert(std::tuple_size_v<decltype(kFields)> <= 32, "one bit per property");
+
+/// Calls `f(field, bit)` for each property.
+template <typename F>
+void forEachField(F&& f) {
+  std::apply([&](const auto&... field) {
+    std::uint32_t bit = 1;
+    ((f(field, bit), bit <<= 1), ...);
+  }, kFields);
+}
+
+// Whether a contact holds a value that a projection without the property would not have.
+bool held(ContactType type) { return type != ContactType::Person; }
+bool held(const Text& text) { return text.has_value(); }
+bool held(const ImageBytes& image) { return image != nullptr; }
+bool held(const Labeled& values) { return !values.empty(); }
+
+/// Known properties that vCards do not carry: nothing to keep, yet no unknown key.
+bool isPropertyWithoutValue(std::string_view key) {
+  using namespace ContactKey;
+  return key == NonGregorianBirthday || key == ImageCropRect || key == PreferredLikenessSource ||
+         key == PreferredPersonaIdentifier;
+}
+
 }  // namespace
 
-Contact projectContact(const Contact& contact, const ContactKeys& keys, std::string* unknownKey) {
+ContactProjection::ContactProjection(ContactKeys keys) : keys_(std::move(keys)) {
+  for (const std::string& key : keys_) {
+    std::uint32_t bits = 0;
+    forEachField([&](const auto& field, std::uint32_t bit) {
+      const bool named = !field.key.empty() && key == field.key;
+      if (named || (field.formatter && key == ContactKey::FullNameFormatterKeys)) bits |= bit;
+    });
+    if (bits == 0 && !isPropertyWithoutValue(key)) unknownKey_ = key;
+    kept_ |= bits;
+  }
+}
+
+Contact ContactProjection::project(const Contact& contact) const {
   Contact out;
   out.identifier = contact.identifier;
-  for (const std::string& key : keys) {
-    using namespace ContactKey;
-    if (key == FullNameFormatterKeys) {
-      out.contactType = contact.contactType;
-      out.formattedName = contact.formattedName;
-      out.namePrefix = contact.namePrefix;
-      out.givenName = contact.givenName;
-      out.middleName = contact.middleName;
-      out.familyName = contact.familyName;
-      out.nameSuffix = contact.nameSuffix;
-      out.organizationName = contact.organizationName;
-    } else if (key == NamePrefix) {
-      out.namePrefix = contact.namePrefix;
-    } else if (key == GivenName) {
-      out.givenName = contact.givenName;
-    } else if (key == MiddleName) {
-      out.middleName = contact.middleName;
-    } else if (key == FamilyName) {
-      out.familyName = contact.familyName;
-    } else if (key == PreviousFamilyName) {
-      out.previousFamilyName = contact.previousFamilyName;
-    } else if (key == NameSuffix) {
-      out.nameSuffix = contact.nameSuffix;
-    } else if (key == Nickname) {
-      out.nickname = contact.nickname;
-    } else if (key == PhoneticGivenName) {
-      out.phoneticGivenName = contact.phoneticGivenName;
-    } else if (key == PhoneticMiddleName) {
-      out.phoneticMiddleName = contact.phoneticMiddleName;
-    } else if (key == PhoneticFamilyName) {
-      out.phoneticFamilyName = contact.phoneticFamilyName;
-    } else if (key == OrganizationName) {
-      out.organizationName = contact.organizationName;
-    } else if (key == DepartmentName) {
-      out.departmentName = contact.departmentName;
-    } else if (key == JobTitle) {
-      out.jobTitle = contact.jobTitle;
-    } else if (key == Birthday) {
-      out.birthday = contact.birthday;
-    } else if (key == Note) {
-      out.note = contact.note;
-    } else if (key == ImageData) {
-      out.imageData = contact.imageData;
-    } else if (key == ThumbnailImageData) {
-      out.thumbnailImageData = contact.thumbnailImageData;
-    } else if (key == ContactKey::ContactType) {
-      out.contactType = contact.contactType;
-    } else if (key == PhoneNumbers) {
-      out.phoneNumbers = contact.phoneNumbers;
-    } else if (key == EmailAddresses) {
-      out.emailAddresses = contact.emailAddresses;
-    } else if (key == PostalAddresses) {
-      out.postalAddresses = contact.postalAddresses;
-    } else if (key == Dates) {
-      out.dates = contact.dates;
-    } else if (key == UrlAddresses) {
-      out.urlAddresses = contact.urlAddresses;
-    } else if (key == Relations) {
-      out.relations = contact.relations;
-    } else if (key == SocialProfiles) {
-      out.socialProfiles = contact.socialProfiles;
-    } else if (key == InstantMessageAddresses) {
-      out.instantMessageAddresses = contact.instantMessageAddresses;
-    } else if (key == NonGregorianBirthday || key == ImageCropRect || key == PreferredLikenessSource ||
-               key == PreferredPersonaIdentifier) {
-      // Known properties that vCards do not carry: nothing to copy.
-    } else if (unknownKey != nullptr) {
-      *unknownKey = key;
-    }
-  }
+  forEachField([&](const auto& field, std::uint32_t bit) {
+    if ((kept_ & bit) != 0) out.*field.member = contact.*field.member;
+  });
   return out;
+}
+
+std::shared_ptr<const Contact> ContactProjection::share(const std::shared_ptr<const Contact>& contact) const {
+  std::uint32_t holds = 0;
+  forEachField([&](const auto& field, std::uint32_t bit) {
+    if (held((*contact).*field.member)) holds |= bit;
+  });
+  if ((holds & ~kept_) == 0) return contact;
+  return std::make_shared<const Contact>(project(*contact));
+}
+
+Contact projectContact(const Contact& contact, const ContactKeys& keys, std::string* unknownKey) {
+  const ContactProjection projection(keys);
+  if (unknownKey != nullptr && !projection.unknownKey().empty()) *unknownKey = projection.unknownKey();
+  return projection.project(contact);
 }
 
 std::optional<std::string> fullNameOfContact(const Contact& contact, std::string_view localeId) {

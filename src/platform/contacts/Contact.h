@@ -98,9 +98,30 @@ struct Contact {
   std::vector<LabeledValue> instantMessageAddresses;
 };
 
-/// A copy of `contact` holding only the properties that `keys` name (the identifier always; the
-/// full-name descriptor stands for every property the formatter reads). A key that names no
-/// property sets `*unknownKey` (when given) and is otherwise ignored.
+/// A key list read once: the properties that it keeps (the identifier always; the full-name
+/// descriptor stands for every property the formatter reads). Projecting many contacts onto one
+/// list then compares no keys, and a contact that holds nothing the list drops is shared, not copied.
+class ContactProjection {
+ public:
+  explicit ContactProjection(ContactKeys keys);
+
+  [[nodiscard]] const ContactKeys& keys() const noexcept { return keys_; }
+  /// The last key that names no property; empty when every key names one.
+  [[nodiscard]] const std::string& unknownKey() const noexcept { return unknownKey_; }
+
+  /// A copy of `contact` holding only the kept properties.
+  [[nodiscard]] Contact project(const Contact& contact) const;
+  /// `contact` itself when it holds nothing that the keys drop, otherwise its projection.
+  [[nodiscard]] std::shared_ptr<const Contact> share(const std::shared_ptr<const Contact>& contact) const;
+
+ private:
+  ContactKeys keys_;
+  std::uint32_t kept_ = 0;
+  std::string unknownKey_;
+};
+
+/// A copy of `contact` holding only the properties that `keys` name. A key that names no property
+/// sets `*unknownKey` (when given) and is otherwise ignored.
 [[nodiscard]] Contact projectContact(const Contact& contact, const ContactKeys& keys,
                                      std::string* unknownKey = nullptr);
 

@@ -194,6 +194,23 @@ struct VCardContactStore::Impl {
   std::once_flag phoneIndexOnce;
   ContactIndex byPhone;
 
+  // Every look-up of a command asks for the same keys: they are read once for all of them.
+  std::mutex projectionMutex;
+  std::shared_ptr<const ContactProjection> lastProjection;
+
+  std::shared_ptr<const ContactProjection> projectionFor(const ContactKeys& keys) {
+    std::lock_guard lock(projectionMutex);
+    if (!lastProjection || lastProjection->keys() != keys) {
+      lastProjection = std::make_shared<const ContactProjection>(keys);
+    }
+    return lastProjection;
+  }
+
+  /// Notes in `*error` a key that names no property.
+  static void reportUnknownKey(const ContactProjection& projection, std::string* error) {
+    if (!projection.unknownKey().empty() && error != nullptr) *error = "Unknown contact key: " + projection.unknownKey();
+  }
+
   void ensureLoaded() {
     std::call_once(loadOnce, [this] { loadBook(); });
   }
@@ -296,16 +313,14 @@ struct VCardContactStore::Impl {
   }
 
   std::vector<std::shared_ptr<const Contact>> project(const ContactIndex& index, const std::string& key,
-                                                      const ContactKeys& keys, std::string* error) const {
+                                                      const ContactKeys& keys, std::string* error) {
     std::vector<std::shared_ptr<const Contact>> out;
     const auto it = index.find(key);
     if (it == index.end()) return out;
-    std::string unknownKey;
+    const auto projection = projectionFor(keys);
     out.reserve(it->second.size());
-    for (const std::uint32_t position : it->second) {
-      out.push_back(std::make_shared<const Contact>(projectContact(*contacts[position], keys, &unknownKey)));
-    }
-    if (!unknownKey.empty() && error != nullptr) *error = "Unknown contact key: " + unknownKey;
+    for (const std::uint32_t position : it->second) out.push_back(projection->share(contacts[position]));
+    reportUnknownKey(*projection, error);
     return out;
   }
 };
@@ -356,10 +371,9 @@ std::shared_ptr<const Contact> VCardContactStore::unifiedContactWithIdentifier(s
     impl_->ensureLoaded();
     const auto it = impl_->byIdentifier.find(std::string(identifier));
     if (it == impl_->byIdentifier.end()) return nullptr;
-    std::string unknownKey;
-    auto contact = std::make_shared<const Contact>(projectContact(*impl_->contacts[it->second], keys, &unknownKey));
-    if (!unknownKey.empty() && error != nullptr) *error = "Unknown contact key: " + unknownKey;
-    return contact;
+    const auto projection = impl_->projectionFor(keys);
+    Impl::reportUnknownKey(*projection, error);
+    return projection->share(impl_->contacts[it->second]);
   } catch (const std::exception& e) {
     if (error != nullptr) *error = e.what();
     return nullptr;
@@ -378,13 +392,11 @@ std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMa
     impl_->ensureLoaded();
     // A name typed by the user is looked for once per command, so the book is scanned.
     const std::string localeId = services().locale.get()->localeId();
-    std::string unknownKey;
+    const auto projection = impl_->projectionFor(keys);
     for (const auto& contact : impl_->contacts) {
-      if (contactMatchesName(*contact, name, localeId)) {
-        out.push_back(std::make_shared<const Contact>(projectContact(*contact, keys, &unknownKey)));
-      }
+      if (contactMatchesName(*contact, name, localeId)) out.push_back(projection->share(contact));
     }
-    if (!unknownKey.empty() && error != nullptr) *error = "Unknown contact key: " + unknownKey;
+    if (!out.empty()) Impl::reportUnknownKey(*projection, error);
   } catch (const std::exception& e) {
     if (error != nullptr) *error = e.what();
     out.clear();
