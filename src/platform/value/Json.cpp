@@ -277,38 +277,39 @@ void convert(const Document& document, std::size_t index, Value& out) {
 /// hold its memory for good. Keeping it saves nothing measurable at that size.
 constexpr std::size_t kKeptParserBytes = 256u * 1024u;
 
-/// The kept parsers, lent out one per reading under a lock. Not thread-local: the plug-in may be
-/// unloaded while the host's threads live on, and their thread-local storage of an unloaded
-/// library is left dangling (the leak checker trips over it).
-class ParserPool {
+/// Kept objects (parsers, and the storage of documents read by them), lent out one at a time under a
+/// lock. Not thread-local: the plug-in may be unloaded while the host's threads live on, and their
+/// thread-local storage of an unloaded library is left dangling (the leak checker trips over it).
+template <typename T>
+class Pool {
  public:
-  std::unique_ptr<simdjson::dom::parser> take() {
+  std::unique_ptr<T> take() {
     {
       std::lock_guard lock(mutex_);
       if (!idle_.empty()) {
-        auto parser = std::move(idle_.back());
+        auto kept = std::move(idle_.back());
         idle_.pop_back();
-        return parser;
+        return kept;
       }
     }
-    return std::make_unique<simdjson::dom::parser>();
+    return std::make_unique<T>();
   }
-  void giveBack(std::unique_ptr<simdjson::dom::parser> parser) noexcept {
+  void giveBack(std::unique_ptr<T> kept) noexcept {
     std::lock_guard lock(mutex_);
-    if (idle_.size() < kKept) idle_.push_back(std::move(parser));  // reserved: never throws
+    if (idle_.size() < kKept) idle_.push_back(std::move(kept));  // reserved: never throws
   }
-  ParserPool() { idle_.reserve(kKept); }
-  ParserPool(const ParserPool&) = delete;
-  ParserPool& operator=(const ParserPool&) = delete;
+  Pool() { idle_.reserve(kKept); }
+  Pool(const Pool&) = delete;
+  Pool& operator=(const Pool&) = delete;
 
  private:
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
   std::mutex mutex_;
-  std::vector<std::unique_ptr<simdjson::dom::parser>> idle_;
+  std::vector<std::unique_ptr<T>> idle_;
 };
 
-ParserPool& parserPool() {
-  static ParserPool pool;
+Pool<simdjson::dom::parser>& parserPool() {
+  static Pool<simdjson::dom::parser> pool;
   return pool;
 }
 
@@ -407,8 +408,25 @@ struct JsonDocument::Storage {
   ~Storage() { releaseValue(value); }
 };
 
+namespace {
+
+/// Documents of texts up to this size keep their buffers (about ten bytes per byte of text) for the
+/// next text, which saves allocating and freeing them on every reading.
+constexpr std::size_t kKeptDocumentBytes = 64u * 1024u;
+
+Pool<JsonDocument::Storage>& storagePool() {
+  static Pool<JsonDocument::Storage> pool;
+  return pool;
+}
+
+}  // namespace
+
 JsonDocument::JsonDocument() noexcept = default;
-JsonDocument::~JsonDocument() = default;
+JsonDocument::~JsonDocument() {
+  if (storage_ && storage_->value.is_null() && storage_->document.capacity() <= kKeptDocumentBytes) {
+    storagePool().giveBack(std::move(storage_));
+  }
+}
 JsonDocument::JsonDocument(JsonDocument&& other) noexcept = default;
 JsonDocument& JsonDocument::operator=(JsonDocument&& other) noexcept = default;
 
@@ -419,7 +437,7 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
   if (text.find('\0') != std::string_view::npos) return std::nullopt;
   try {
     JsonDocument document;
-    document.storage_ = std::make_unique<JsonDocument::Storage>();
+    document.storage_ = storagePool().take();
     JsonDocument::Storage& storage = *document.storage_;
     if (simdjsonMayRead(text)) {
       // simdjson reads several times faster than nlohmann's reader; what it refuses, nlohmann's decides.

@@ -36,10 +36,12 @@ class JsonDocument {
   /// The top-level value; absent for a default-made document.
   [[nodiscard]] JsonView root() const noexcept { return root_; }
 
+  /// What a document holds, kept for the next reading when the document goes.
+  struct Storage;
+
  private:
   friend std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept;
   friend std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept;
-  struct Storage;
   std::unique_ptr<Storage> storage_;
   JsonView root_;
 };
