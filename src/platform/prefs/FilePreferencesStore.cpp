@@ -152,20 +152,26 @@ Value FilePreferencesStore::readFile(const std::filesystem::path& file, bool log
   return Value::object();
 }
 
-void FilePreferencesStore::refresh(std::string_view domainName, Domain& domain) {
-  const auto file = fileForDomain(domainName);
-  const FileStamp stamp = stampOf(file);
+FilePreferencesStore::Domain& FilePreferencesStore::domainNamed(std::string_view domainName) {
+  if (const auto it = domains_.find(domainName); it != domains_.end()) return it->second;
+  Domain& domain = domains_[std::string(domainName)];
+  domain.file = fileForDomain(domainName);
+  return domain;
+}
+
+void FilePreferencesStore::refresh(Domain& domain) {
+  const FileStamp stamp = stampOf(domain.file);
   if (domain.stamp && *domain.stamp == stamp) return;
-  domain.content = stamp.exists ? readFile(file, true) : Value::object();
+  domain.content = stamp.exists ? readFile(domain.file, true) : Value::object();
   domain.stamp = stamp;
 }
 
 std::optional<Value> FilePreferencesStore::value(std::string_view domainName, std::string_view key) {
   if (!isValidDomain(domainName)) return std::nullopt;
   std::lock_guard lock(mutex_);
-  Domain& domain = domains_[std::string(domainName)];
+  Domain& domain = domainNamed(domainName);
   if (auto it = domain.pending.find(key); it != domain.pending.end()) return it->second;
-  refresh(domainName, domain);
+  refresh(domain);
   if (const Value* v = member(domain.content, key)) return *v;
   return std::nullopt;
 }
@@ -176,16 +182,16 @@ void FilePreferencesStore::setValue(std::string_view domainName, std::string_vie
     return;
   }
   std::lock_guard lock(mutex_);
-  domains_[std::string(domainName)].pending[std::string(key)] = std::move(value);
+  domainNamed(domainName).pending[std::string(key)] = std::move(value);
 }
 
 bool FilePreferencesStore::synchronize(std::string_view domainName) {
   if (!isValidDomain(domainName)) return false;
   std::lock_guard lock(mutex_);
-  Domain& domain = domains_[std::string(domainName)];
+  Domain& domain = domainNamed(domainName);
   if (domain.pending.empty()) return true;
 
-  const auto file = fileForDomain(domainName);
+  const std::filesystem::path& file = domain.file;
   auto fail = [&](const char* step) {
     Log::shared().error("Preferences for %@ could not be written (%@: %@)", domainName, step, std::strerror(errno));
     return false;

@@ -37,6 +37,7 @@ class FilePreferencesStore final : public PreferencesStore {
     bool operator==(const FileStamp&) const = default;
   };
   struct Domain {
+    std::filesystem::path file;
     std::optional<FileStamp> stamp;  // of the content below; nothing until first read
     Value content = Value::object();
     std::map<std::string, std::optional<Value>, std::less<>> pending;
@@ -46,7 +47,9 @@ class FilePreferencesStore final : public PreferencesStore {
   static bool isValidDomain(std::string_view domain) noexcept;
   static FileStamp stampOf(const std::filesystem::path& file) noexcept;
   Value readFile(const std::filesystem::path& file, bool logCorruption);
-  void refresh(std::string_view domainName, Domain& domain);
+  /// The domain's state, made on first use; the caller holds the lock.
+  Domain& domainNamed(std::string_view domainName);
+  void refresh(Domain& domain);
 
   std::filesystem::path directory_;
   std::mutex mutex_;
