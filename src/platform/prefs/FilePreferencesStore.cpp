@@ -1,3 +1,4 @@
+#include "platform/fs/Files.h"
 #include "platform/log/Log.h"
 #include "platform/prefs/FilePreferencesStore.h"
 #include "platform/value/Json.h"
@@ -44,24 +45,6 @@ bool writeAll(int fd, std::string_view data) noexcept {
     data.remove_prefix(static_cast<std::size_t>(n));
   }
   return true;
-}
-
-std::optional<std::string> readAll(const std::filesystem::path& file) {
-  Fd fd(::open(file.c_str(), O_RDONLY | O_CLOEXEC));
-  if (fd.get() < 0) return std::nullopt;
-  std::string text;
-  char buffer[16384];
-  for (;;) {
-    const ssize_t n = ::read(fd.get(), buffer, sizeof buffer);
-    if (n < 0) {
-      if (errno == EINTR) continue;
-      return std::nullopt;
-    }
-    if (n == 0) break;
-    text.append(buffer, static_cast<std::size_t>(n));
-    if (text.size() > kMaxFileBytes) return std::nullopt;
-  }
-  return text;
 }
 
 // Opens and locks the domain's lock file `name` in `dir`. A writer renames the lock file it holds
@@ -141,7 +124,7 @@ FilePreferencesStore::FileStamp FilePreferencesStore::stampOf(const std::filesys
 }
 
 Value FilePreferencesStore::readFile(const std::filesystem::path& file, bool logCorruption) {
-  auto text = readAll(file);
+  auto text = readWholeFile(file, kMaxFileBytes);
   if (!text) return Value::object();  // vanished between stat and open, or unreadable
   auto parsed = parseJson(*text);
   if (parsed && parsed->is_object()) return std::move(*parsed);

@@ -1,4 +1,5 @@
 #include "platform/config/Configuration.h"
+#include "platform/fs/Files.h"
 #include "platform/log/Log.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
 #include "platform/value/Json.h"
@@ -13,7 +14,6 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
-#include <fstream>
 #include <mutex>
 
 namespace kyn::platform {
@@ -32,22 +32,6 @@ std::string trim(std::string_view s) {
   while (!s.empty() && blank(s.back())) s.remove_suffix(1);
   return std::string(s);
 }
-
-std::optional<std::string> readText(const std::filesystem::path& path, std::size_t limit) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in) return std::nullopt;
-  std::string text;
-  char buffer[4096];
-  while (in.read(buffer, sizeof buffer) || in.gcount() > 0) {
-    text.append(buffer, static_cast<std::size_t>(in.gcount()));
-    if (text.size() > limit) return std::nullopt;
-  }
-  return text;
-}
-
-}  // namespace
-
-namespace {
 
 std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, const std::string& text) {
   auto json = parseJson(text);
@@ -84,7 +68,7 @@ std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, c
 std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   std::error_code ec;
   if (!std::filesystem::exists(file, ec)) return std::nullopt;
-  auto text = readText(file, kMaxAccountBytes);
+  auto text = readWholeFile(file, kMaxAccountBytes);
   if (!text) {
     Log::shared().error("Account file %@ cannot be read or is too large; no account is signed in", file.string());
     return std::nullopt;
@@ -185,7 +169,7 @@ std::optional<std::string> LinuxSystemInfo::deviceUDID() {
 }
 
 std::optional<std::string> LinuxSystemInfo::productType() {
-  auto text = readText(paths_.productName, 256);
+  auto text = readWholeFile(paths_.productName, 256);
   if (!text) return std::nullopt;
   std::string name = trim(*text);
   if (name.empty()) return std::nullopt;
@@ -193,14 +177,14 @@ std::optional<std::string> LinuxSystemInfo::productType() {
 }
 
 std::optional<std::string> LinuxSystemInfo::osVersion() {
-  auto text = readText(paths_.osRelease, 64 * 1024);
-  if (!text) text = readText("/usr/lib/os-release", 64 * 1024);
+  auto text = readWholeFile(paths_.osRelease, 64 * 1024);
+  if (!text) text = readWholeFile("/usr/lib/os-release", 64 * 1024);
   if (!text) return std::nullopt;
   return osReleaseField(*text, "VERSION_ID");
 }
 
 std::optional<std::string> LinuxSystemInfo::osBuildVersion() {
-  if (auto text = readText(paths_.osRelease, 64 * 1024)) {
+  if (auto text = readWholeFile(paths_.osRelease, 64 * 1024)) {
     if (auto build = osReleaseField(*text, "BUILD_ID")) return build;
   }
   struct utsname u {};
