@@ -72,7 +72,8 @@ TEST(LanguageTags, BecomeIcuLocaleIds) {
 TEST(Localization, TheSystemLanguageIsTheDefaultLocaleUnlessThatIsThePosixOne) {
   const icu::Locale before = icu::Locale::getDefault();
   const std::pair<const char*, std::optional<std::string>> cases[] = {
-      {"de_CH", "de-CH"}, {"fr", "fr"}, {"en_US_POSIX", std::nullopt}, {"c", std::nullopt}, {"", std::nullopt}};
+      {"de_CH", "de-CH"}, {"fr", "fr"}, {"en_US_POSIX", std::nullopt}, {"c", std::nullopt}, {"", std::nullopt},
+      {"de_DE_EURO", "de-DE-x-lvariant-euro"}};  // from the system's "de_DE@euro"
   for (const auto& [id, tag] : cases) {
     UErrorCode status = U_ZERO_ERROR;
     icu::Locale::setDefault(icu::Locale(id), status);

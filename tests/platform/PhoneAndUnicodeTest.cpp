@@ -14,6 +14,14 @@ TEST(PhoneNumbers, CanonicalFormIsOneTextPerNumber) {
   EXPECT_EQ(formatPhoneNumber("01 99 00 12 34", "fr", PhoneNumberStyle::Canonical), "+33199001234");
 }
 
+TEST(PhoneNumbers, NumbersThatLeftTheCacheOfRecentResultsAreReadAfresh) {
+  auto number = [](int i) { return "+1 503 555 " + std::to_string(10000 + i).substr(1); };
+  for (int i = 0; i < 8200; ++i) (void)formatPhoneNumber(number(i), "", PhoneNumberStyle::Canonical);
+  for (int i = 0; i < 3; ++i) {
+    EXPECT_EQ(formatPhoneNumber(number(i), "", PhoneNumberStyle::Canonical), "+1503555000" + std::to_string(i));
+  }
+}
+
 TEST(PhoneNumbers, TheRegionDecidesNumbersWithoutAnInternationalPrefix) {
   EXPECT_EQ(formatPhoneNumber("020 7946 0018", "gb", PhoneNumberStyle::Canonical), "+442079460018");
   EXPECT_NE(formatPhoneNumber("020 7946 0018", "us", PhoneNumberStyle::Canonical), "+442079460018");

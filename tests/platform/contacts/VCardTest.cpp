@@ -259,11 +259,12 @@ TEST(VCardProperties, TelUrisLoseTheSchemeAndKeepTheirExtension) {
                                   "TEL;VALUE=uri:TEL:+1-503-555-0105;phone-context=example.com\r\n"
                                   "TEL:tel:+1%20503%20555%200106\r\n"
                                   "TEL:tel:+1-503-555-0108;ext=%E9\r\n"  // escapes that make no UTF-8
+                                  "TEL:tel:+1-503-555-0109;ext=\r\n"
                                   "TEL: (503) 555-0107 \r\n",
                                   "4.0"));
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"work", "+1-503-555-0104 ext. 102"}, {std::nullopt, "+1-503-555-0105"},
                                      {std::nullopt, "+1 503 555 0106"}, {std::nullopt, "+1-503-555-0108 ext. \xC3\xA9"},
-                                     {std::nullopt, "(503) 555-0107"}}));
+                                     {std::nullopt, "+1-503-555-0109"}, {std::nullopt, "(503) 555-0107"}}));
 }
 
 
