@@ -14,7 +14,6 @@ TEST_F(KYNBaseCmdTest, TakesSchemeCredentialsAndHostFromTheAccountUnlessARedirec
   EXPECT_EQ(command.password(), "secret-token-42");
   test::postRedirect("kyn.example.test", "p07-kyn.example.test");
   EXPECT_EQ(KYNBaseCmd().host(), "p07-kyn.example.test");
-  EXPECT_EQ(KYNBaseCmd().host(), "p07-kyn.example.test");
   Common::sharedInstance().flushRedirection();
   EXPECT_EQ(KYNBaseCmd().host(), "kyn.example.test");
 

@@ -32,7 +32,6 @@ TEST_F(SetGeoFenceCmdTest, TheBodyCarriesEveryKeyInItsOrder) {
   command->trigger = std::string(AXKynGeoFenceTriggerImmediateValue);
   command->onetimeonly = true;
   command->fenceType = std::string(AXKynFenceTypeNotifyMeValue);
-  EXPECT_EQ(command->url(), "https://kyn.example.test/kytrservice/friends/va/geoFence");
   Value body = command->jsonBodyDictionary();
   EXPECT_EQ(body["requestedLocation"]["horizontalAccuracy"], 65.0);
   body["requestedLocation"] = body["requestedLocation"]["latitude"];

@@ -9,7 +9,6 @@ using ShowHideLocationCmdTest = test::PlatformTest;
 
 TEST_F(ShowHideLocationCmdTest, TheBodyIsTheClientContextAndTheOneFlag) {
   ShowHideLocationCmd command;
-  EXPECT_EQ(command.url(), "https://kyn.example.test/kytrservice/friends/va/showHideLocation");
   command.hideLocation = true;
   // Compared as text, so that the order of the keys counts too.
   const Value expected = {{"clientContext", KYNBaseCmd::staticClientContext()}, {"prefs", {{"hideLocation", "Yes"}}}};

@@ -1,7 +1,6 @@
 #include "Harness.h"
 
 #include <fstream>
-#include <sstream>
 #include <stdexcept>
 
 namespace kyn::itest {
@@ -38,10 +37,7 @@ Sim::Sim(const std::filesystem::path& dir, const Json& dataSet, std::vector<std:
   const auto colon = line.rfind(':');
   if (line.find("listening on https://") == std::string::npos || colon == std::string::npos) {
     process_.reset();
-    std::ifstream err(dir_ / "sim.err");
-    std::stringstream text;
-    text << err.rdbuf();
-    throw std::runtime_error("kyn-sim did not start: " + line + " " + text.str());
+    throw std::runtime_error("kyn-sim did not start: " + line + " " + test::readFile(dir_ / "sim.err"));
   }
   port_ = std::stoi(line.substr(colon + 1));
 }

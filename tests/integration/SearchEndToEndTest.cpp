@@ -3,8 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <fstream>
-
 namespace kyn::itest {
 namespace {
 
@@ -69,7 +67,6 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   // Ada's handle is the one the assistant sent: its own person stands for her, as it was given.
   EXPECT_EQ(locations[0]["friend"]["object"], Json::parse(R"({"class":"AXPerson",
       "emails":[{"class":"AXEmail","emailAddress":"ada@example.com"}]})"));
-  EXPECT_EQ(locations[0]["label"], "Work");
   // The server keys Bram by his canonical number, which is not how the assistant held it: he is
   // named from the contacts instead.
   EXPECT_EQ(locations[1]["friend"]["data"], "+15035550102");
@@ -78,7 +75,6 @@ TEST_F(SearchEndToEnd, FriendsAreFoundAndNamedFromTheContacts) {
   const auto requests = sim->requests();
   ASSERT_EQ(requests.size(), 1u);
   EXPECT_EQ(requests[0]["handles"], Json::parse(R"(["ada@example.com","+15035550102"])"));
-  EXPECT_EQ(requests[0]["authorised"], true);
   EXPECT_EQ(requests[0]["apiVersion"], "4.0");
 }
 
@@ -116,7 +112,7 @@ TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewH
   const std::string port = std::to_string(sim->port());
   EXPECT_EQ(hosts, (std::vector<std::string>{"localhost:" + port, "127.0.0.1:" + port, "127.0.0.1:" + port,
                                              "127.0.0.1:" + port}));
-  const auto prefs = Json::parse(std::ifstream(configDir.path() / "preferences" / "com.zanto.tessel.kyn.assistant.json"));
+  const auto prefs = Json::parse(test::readFile(configDir.path() / "preferences" / "com.zanto.tessel.kyn.assistant.json"));
   EXPECT_EQ(prefs["RedirectedHostKey"], "127.0.0.1:" + port);
 }
 
@@ -239,8 +235,7 @@ TEST_F(SearchEndToEnd, TheHostNamesFriendsAndTellsFailuresApart) {
   const auto withPictures = runHost(configDir.path(), {"--pictures", pictures.path().string(), "search", "--friend",
                                                         "ada@example.com", "--friend", "+15035550102"});
   EXPECT_EQ(withPictures.status, 0) << withPictures.output;
-  std::ifstream picture(pictures.path() / "ada@example.com.pnm", std::ios::binary);
-  EXPECT_EQ(std::string(std::istreambuf_iterator<char>(picture), {}), kAdaPicture);
+  EXPECT_EQ(test::readFile(pictures.path() / "ada@example.com.pnm"), kAdaPicture);
   EXPECT_EQ(std::distance(std::filesystem::directory_iterator(pictures.path()), {}), 1);  // Bram has none
 
   std::filesystem::remove(configDir.path() / "account.json");

@@ -9,7 +9,6 @@
 #include <gtest/gtest.h>
 
 #include <atomic>
-#include <fstream>
 #include <thread>
 
 namespace kyn::itest {
@@ -160,15 +159,9 @@ TEST(TransportEndToEnd, ARedirectCountsOnlyWhenTheNewHostAnswered) {
     test::TempDir simDir;
     test::TempDir configDir;
     Sim sim(simDir.path(), kNoFriends, c.simArgs);
-    const auto trusted = configDir.path() / "trusted.pem";
-    {
-      std::ofstream bundle(trusted);
-      bundle << std::ifstream(sim.caFile()).rdbuf();
-      if (c.trustTarget) bundle << std::ifstream(target.caFile()).rdbuf();
-    }
-
+    const std::string targetCa = c.trustTarget ? test::readFile(target.caFile()) : "";
     platform::TransportSettings settings;
-    settings.caFile = trusted;
+    settings.caFile = configDir.write("trusted.pem", test::readFile(sim.caFile()) + targetCa);
     settings.maxRedirects = c.maxRedirects;
     const auto ended = exchange(localhost(sim.port()), settings);
     const auto& command = *ended.command;

@@ -9,7 +9,6 @@ namespace {
 
 Contact sample() {
   Contact c;
-  c.identifier = "card-1";
   c.namePrefix = "Dr.";
   c.givenName = "Ada";
   c.middleName = "King";
@@ -17,24 +16,10 @@ Contact sample() {
   c.nameSuffix = "Jr.";
   c.organizationName = "Analytical Works";
   c.note = "private";
-  c.imageData = test::tinyPicture();
-  c.phoneNumbers = {{"mobile", "+15035550101"}};
-  c.emailAddresses = {{"home", "ada@example.com"}};
   return c;
 }
 
-TEST(ContactProjection, KeepsOnlyWhatTheKeysName) {
-  std::string unknown;
-  const Contact p = projectContact(sample(), {"givenName", "emailAddresses", "noSuchKey"}, &unknown);
-  EXPECT_EQ(p.identifier, "card-1");
-  EXPECT_EQ(p.givenName, "Ada");
-  EXPECT_EQ(p.emailAddresses.size(), 1u);
-  EXPECT_FALSE(p.familyName);
-  EXPECT_FALSE(p.note);
-  EXPECT_FALSE(p.imageData);
-  EXPECT_TRUE(p.phoneNumbers.empty());
-  EXPECT_EQ(unknown, "noSuchKey");
-  // The full-name descriptor brings every name part.
+TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePart) {
   const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
   EXPECT_EQ(fullNameOfContact(named, "en_US"), fullNameOfContact(sample(), "en_US"));
   EXPECT_FALSE(named.note);

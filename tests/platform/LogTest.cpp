@@ -25,7 +25,6 @@ TEST(Log, LinesBelowTheMinimumLevelAreDroppedAndLevelsHaveNames) {
   EXPECT_EQ(sink->records().size(), 2u);
   EXPECT_EQ(logLevelFromName("error"), LogLevel::Error);
   EXPECT_EQ(logLevelFromName("off"), LogLevel::Off);
-  EXPECT_FALSE(logLevelFromName("loud"));
 }
 
 }  // namespace

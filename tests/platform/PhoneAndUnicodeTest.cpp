@@ -30,12 +30,6 @@ TEST(PhoneNumbers, TheRegionDecidesNumbersWithoutAnInternationalPrefix) {
   EXPECT_EQ(formatPhoneNumber("+14085550100", "", PhoneNumberStyle::Display), "+1 408-555-0100");
 }
 
-TEST(PhoneNumbers, DigitsOfOtherScriptsAreRead) {
-  EXPECT_EQ(formatPhoneNumber("\u0664\u0660\u0668 \u0665\u0665\u0665 \u0660\u0661\u0660\u0660", "us",
-                              PhoneNumberStyle::Canonical),
-            "+14085550100");  // Arabic-Indic digits
-}
-
 TEST(PhoneNumbers, TextsThatAreNoNumberGiveNothing) {
   const std::string texts[] = {"", "Ada", "BusinessPhone", "+", "\xFF\xFE", "--", "12", "11111111111111111",
                                std::string(300, '5')};  // the last three: lengths impossible for the country
