@@ -19,7 +19,7 @@ Contact sample() {
   return c;
 }
 
-TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePart) {
+TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePartAndAWholeContactIsShared) {
   const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
   EXPECT_EQ(fullNameOfContact(named, "en_US"), fullNameOfContact(sample(), "en_US"));
   EXPECT_FALSE(named.note);
