@@ -33,6 +33,9 @@ TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePartAndAWholeContact
   const auto copied = projection.share(std::make_shared<const Contact>(born));
   EXPECT_FALSE(copied->birthday);
   EXPECT_EQ(copied->note, "private");
+  Contact organization;  // nothing else that the note-only list drops
+  organization.contactType = ContactType::Organization;
+  EXPECT_EQ(ContactProjection({"note"}).share(std::make_shared<const Contact>(organization))->contactType, ContactType::Person);
 }
 
 TEST(ContactFullName, TheCardsOwnNameWins) {

@@ -67,13 +67,13 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
                            photo));
   book.write("2.vcf", test::vcard("UID:other\r\nFN:Someone Else\r\n"));
   book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
-                           "X-PHONETIC-MIDDLE-NAME:Ree\r\nNOTE:n\r\nNICKNAME:Annie\r\n"
+                           "X-PHONETIC-MIDDLE-NAME:Ree\r\nX-PHONETIC-LAST-NAME:Ek\r\nNOTE:n\r\nNICKNAME:Annie\r\n"
                            "TEL;TYPE=CELL:+1 503 555 0110\r\nTEL;TYPE=HOME:+1 503 555 0110\r\nEMAIL:ann@example.org\r\n"
                            "PHOTO;ENCODING=b:iVBORw==\r\n"));
   VCardContactStore store(book.path(), "us");
   EXPECT_EQ(store.load(), 2u);
   const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "jobTitle", "previousFamilyName",
-                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
+                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneticFamilyName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
   EXPECT_EQ(ann->givenName, "Ann");  // the first card's value
@@ -84,6 +84,7 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   EXPECT_EQ(ann->nickname, "Annie");
   EXPECT_EQ(ann->nameSuffix, "III");
   EXPECT_EQ(ann->phoneticMiddleName, "Ree");
+  EXPECT_EQ(ann->phoneticFamilyName, "Ek");
   EXPECT_EQ(ann->departmentName, "Ops");
   EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
   EXPECT_EQ(ann->emailAddresses.size(), 2u);

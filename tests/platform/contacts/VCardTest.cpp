@@ -346,6 +346,7 @@ TEST(VCardPictures, FirstPhotoIsThePictureAndTypeThumbnailTheSmallOne) {
   // A data URI without a media type or base64 holds its bytes percent-encoded.
   EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO:data:,%01%02%03\r\n", "4.0")).imageData), kOther);
   EXPECT_EQ(bytesOf(parseOne(test::vcard(std::string("PHOTO:data:;base64,") + kOtherBase64 + "\r\n", "4.0")).imageData), kOther);
+  EXPECT_EQ(bytesOf(parseOne(test::vcard("PHOTO;ENCODING=QUOTED-PRINTABLE:=01=02=03\r\n", "2.1")).imageData), kOther);
 }
 
 TEST(VCardPictures, ATenMegabytePhotoOfEveryBase64LetterIsRead) {
