@@ -5,6 +5,7 @@
 #include <simdjson.h>
 
 #include <algorithm>
+#include <atomic>
 #include <charconv>
 #include <cstring>
 #include <limits>
@@ -283,8 +284,10 @@ constexpr std::size_t kKeptParserBytes = 256u * 1024u;
 template <typename T>
 class Pool {
  public:
+  ~Pool() { closed_.store(true); }
+
   std::unique_ptr<T> take() {
-    {
+    if (!closed_.load()) {
       std::lock_guard lock(mutex_);
       if (!idle_.empty()) {
         auto kept = std::move(idle_.back());
@@ -294,7 +297,9 @@ class Pool {
     }
     return std::make_unique<T>();
   }
+  /// A document may outlive the pool, both being statics torn down at exit: then it is freed.
   void giveBack(std::unique_ptr<T> kept) noexcept {
+    if (closed_.load()) return;
     std::lock_guard lock(mutex_);
     if (idle_.size() < kKept) idle_.push_back(std::move(kept));  // reserved: never throws
   }
@@ -304,6 +309,7 @@ class Pool {
 
  private:
   static constexpr std::size_t kKept = 4;  // a host thread or two and the network threads
+  static inline std::atomic<bool> closed_{false};  // trivially destroyed: readable after ~Pool
   std::mutex mutex_;
   std::vector<std::unique_ptr<T>> idle_;
 };
