@@ -191,13 +191,15 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
       "ADR;TYPE=HOME:PO 7;Apt 3;12 Elm St\\nBack door;Springfield;OR;97400;Testland\r\n"
       "ADR:;;;Lakeview\r\n"  // trailing empty components left out
       "ADR:;;;;;;\r\n"
-      "ADR:;;1 Main St;;;;;Extra;More\r\n"));
+      "ADR:;;1 Main St;;;;;Extra;More\r\n"
+      "NICKNAME:\tAl\\n\r\n"));  // blanks and line breaks around a value go, also escaped ones
   EXPECT_EQ(c.familyName, "O;Neil");
   EXPECT_EQ(c.givenName, "Mary Ann");  // list items joined with a space
   EXPECT_EQ(c.middleName, "Jo,Beth");  // an escaped comma is no separator
   EXPECT_EQ(c.namePrefix, "Dr.");
   EXPECT_EQ(c.nameSuffix, "Jr. PhD");
   EXPECT_EQ(c.note, "a\nb\nc,d;e\\f\"g:h\\");  // a last lone backslash stays
+  EXPECT_EQ(c.nickname, "Al");
   EXPECT_EQ(c.urlAddresses, (Labeled{{std::nullopt, "http://example.com/a,b"}}));
   EXPECT_EQ(c.organizationName, "Acme; Sons");
   EXPECT_EQ(c.departmentName, "Research, Lab 2");
