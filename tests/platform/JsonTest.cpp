@@ -44,6 +44,10 @@ TEST(Json, BoundsDepthAndSize) {
   limits.maxDepth = 10;
   EXPECT_TRUE(parseJson(std::string(10, '[') + std::string(10, ']'), limits));
   EXPECT_FALSE(parseJson(std::string(11, '[') + std::string(11, ']'), limits));
+  // A number takes two words of the reader's tape; the nesting right after one still counts.
+  for (const char* number : {"1.5", "1", "18446744073709551615"}) {
+    EXPECT_FALSE(parseJson(std::string("[") + number + "," + std::string(10, '[') + std::string(11, ']'), limits)) << number;
+  }
   // Far beyond the default depth: rejected without exhausting the stack.
   EXPECT_FALSE(parseJson(std::string(100000, '[') + std::string(100000, ']')));
   limits.maxBytes = 8;

@@ -220,7 +220,7 @@ TEST(VCardProperties, EveryFieldOfAContact) {
       "RELATED;TYPE=spouse:urn:uuid:1234\r\nX-ABRELATEDNAMES:Bob\r\nX-SPOUSE:Carol\r\n"
       "IMPP;TYPE=home:xmpp:alice@example.com\r\nX-AIM:alice.aim\r\nX-JABBER:alice@example.net\r\n"
       "X-ICQ:12345\r\nX-MS-IMADDRESS:alice@example.org\r\n"
-      "X-SOCIALPROFILE;TYPE=chirper:https://social.example.com/alice\r\n"
+      "X-SOCIALPROFILE;TYPE=PREF;TYPE=chirper:https://social.example.com/alice\r\n"
       "X-UNKNOWN:ignored\r\nCATEGORIES:a,b\r\nORG:Acme\r\n"
       "FN:Second\r\nN:Two;Other;Wrong;Mr.;Jr.\r\nORG:Other;Dept\r\n"));  // the first value of a single-valued field wins
   EXPECT_EQ(c.identifier, "alice-1");
