@@ -44,6 +44,13 @@ TEST(ContactFullName, TheCardsOwnNameWins) {
   EXPECT_EQ(fullNameOfContact(c, "en_US"), "Countess Ada");
   c.formattedName = "";
   EXPECT_EQ(fullNameOfContact(c, "en_US"), "Dr. Ada King Lovelace Jr.");
+  // Any one name part makes a person's name; the organisation stands in only without one.
+  c.givenName.reset();
+  c.middleName.reset();
+  EXPECT_EQ(fullNameOfContact(c, "en_US"), "Dr. Lovelace Jr.");
+  c.familyName.reset();
+  c.middleName = "King";
+  EXPECT_EQ(fullNameOfContact(c, "en_US"), "Dr. King Jr.");
 }
 
 TEST(ContactFullName, PartsInTheLocalesOrder) {

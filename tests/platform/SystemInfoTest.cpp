@@ -161,6 +161,8 @@ TEST_F(SystemInfoTest, SigningInWritesBothFilesWholeAndSigningOutRemovesThem) {
   EXPECT_TRUE(removeSignIn(dir));
   EXPECT_FALSE(fs::exists(dir / "account.json") || fs::exists(dir / "token"));
   EXPECT_FALSE(removeSignIn(dir));
+  configDir->write("new/config/token", "tok-3", 0600);  // half an account is still signed out
+  EXPECT_TRUE(removeSignIn(dir));
 }
 
 }  // namespace

@@ -73,7 +73,7 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   VCardContactStore store(book.path(), "us");
   EXPECT_EQ(store.load(), 2u);
   const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "jobTitle", "previousFamilyName",
-                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneticFamilyName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
+                                                              "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneticFamilyName", "organizationName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
   EXPECT_EQ(ann->givenName, "Ann");  // the first card's value
@@ -85,6 +85,7 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   EXPECT_EQ(ann->nameSuffix, "III");
   EXPECT_EQ(ann->phoneticMiddleName, "Ree");
   EXPECT_EQ(ann->phoneticFamilyName, "Ek");
+  EXPECT_EQ(ann->organizationName, "Air");
   EXPECT_EQ(ann->departmentName, "Ops");
   EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
   EXPECT_EQ(ann->emailAddresses.size(), 2u);
