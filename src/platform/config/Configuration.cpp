@@ -1,26 +1,15 @@
 #include "platform/config/Configuration.h"
 
+#include "platform/fs/Files.h"
 #include "platform/log/Log.h"
 #include "platform/value/Json.h"
 
 #include <algorithm>
 #include <cmath>
 #include <cstdlib>
-#include <fstream>
-#include <sstream>
 
 namespace kyn::platform {
 namespace {
-
-std::optional<std::string> readSmallFile(const std::filesystem::path& path, std::size_t limit) {
-  std::ifstream in(path, std::ios::binary);
-  if (!in) return std::nullopt;
-  std::string text;
-  text.resize(limit + 1);
-  in.read(text.data(), static_cast<std::streamsize>(text.size()));
-  text.resize(static_cast<std::size_t>(in.gcount()));
-  return text;
-}
 
 std::filesystem::path resolve(const std::filesystem::path& base, const std::string& text) {
   std::filesystem::path p(text);
@@ -43,9 +32,11 @@ Configuration Configuration::load(const std::filesystem::path& directory) {
   c.contactsPath_ = directory / "contacts";
 
   const auto file = directory / "config.json";
-  auto text = readSmallFile(file, 1u << 20);
-  if (!text) return c;
-  auto json = parseJson(*text);
+  // A missing file means defaults; one too large (over 1 MiB) or unreadable is reported like bad JSON.
+  auto text = readWholeFile(file, 1u << 20);
+  std::error_code ec;
+  if (!text && !std::filesystem::exists(file, ec)) return c;
+  auto json = text ? parseJson(*text) : std::nullopt;
   if (!json || !json->is_object()) {
     Log::shared().error("Configuration file %@ is not a JSON object; using defaults", file.string());
     return c;

@@ -1,11 +1,10 @@
 #include "platform/resources/Resources.h"
 
+#include "platform/fs/Files.h"
 #include "platform/value/Json.h"
 
 #include <dlfcn.h>
 
-#include <fstream>
-#include <sstream>
 
 namespace kyn::platform {
 
@@ -23,11 +22,9 @@ std::optional<std::filesystem::path> resourceDirectory() {
 std::optional<Value> readResourceDictionary(std::string_view name) {
   const auto directory = resourceDirectory();
   if (!directory) return std::nullopt;
-  std::ifstream in(*directory / (std::string(name) + ".json"), std::ios::binary);
-  if (!in) return std::nullopt;
-  std::stringstream text;
-  text << in.rdbuf();
-  auto value = parseJson(text.str());
+  const auto text = readWholeFile(*directory / (std::string(name) + ".json"), 4u << 20);
+  if (!text) return std::nullopt;
+  auto value = parseJson(*text);
   if (!value || !value->is_object()) return std::nullopt;
   return value;
 }

@@ -434,7 +434,12 @@ JsonDocument::~JsonDocument() {
   }
 }
 JsonDocument::JsonDocument(JsonDocument&& other) noexcept = default;
-JsonDocument& JsonDocument::operator=(JsonDocument&& other) noexcept = default;
+// The old storage leaves with `other`, whose destructor keeps it for the next reading.
+JsonDocument& JsonDocument::operator=(JsonDocument&& other) noexcept {
+  std::swap(storage_, other.storage_);
+  std::swap(root_, other.root_);
+  return *this;
+}
 
 std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept {
   if (text.size() > limits.maxBytes) return std::nullopt;
