@@ -68,6 +68,9 @@ TEST_F(ConfigurationTest, AFieldOfTheWrongTypeOrOutOfRangeKeepsItsDefaultAndIsLo
   EXPECT_EQ(withFile("[1]").transport().maxRedirects, defaults.maxRedirects);
   EXPECT_EQ(withFile("{\"language\":").contactsPath(), configDir->path() / "contacts");
   EXPECT_EQ(errors(), 12u);
+  const std::string large = R"({"language":"de","padding":")" + std::string(1u << 20, ' ') + "\"}";
+  EXPECT_FALSE(withFile(large.c_str()).language());  // over 1 MiB: not read, and said so
+  EXPECT_EQ(errors(), 13u);
 }
 
 // A host that configures another directory must not keep writing into the first one, nor keep
