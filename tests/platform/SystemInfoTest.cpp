@@ -86,11 +86,11 @@ TEST_F(SystemInfoTest, OnlyAPrivateRegularTokenFileIsRead) {
 
 TEST_F(SystemInfoTest, DeviceFacts) {
   configDir->write("product_name", "ThinkStation P3\n");
-  configDir->write("os-release", "NAME=\"Debian\"\nVERSION_IDX=9\nVERSION_ID='12'\nEMPTY=\"\"\nBUILD_ID=rolling\n");
+  configDir->write("os-release", "NAME=\"Debian\"\nVERSION_IDX=9\nVERSION_ID='12'\nEMPTY=\"\"\nBUILD_ID=2022-2\n");
   auto facts = info();
   EXPECT_EQ(facts.productType(), "ThinkStation P3");
   EXPECT_EQ(facts.osVersion(), "12");
-  EXPECT_EQ(facts.osBuildVersion(), "rolling");
+  EXPECT_EQ(facts.osBuildVersion(), "2022-2");  // no quotes to strip
   EXPECT_FALSE(osReleaseField("EMPTY=\"\"\n", "EMPTY"));
   configDir->write("product_name", "  \n");
   EXPECT_FALSE(facts.productType());

@@ -48,7 +48,7 @@ const char* const kDescription =
     "Faults (--fault) shape the answers of the service's endpoints (or those of --fault-path):\n"
     "status:CODE, slow:MS, reset (TCP reset, no answer), garbage (200 with random bytes), body:PATH\n"
     "(200 with the bytes of PATH, read at each request), truncate (Content-Length of the whole\n"
-    "answer, half of it sent, connection dropped), redirect:URL (307 to URL, whatever it names).\n"
+    "answer, half of it sent, connection dropped), redirect:URL (307 to URL, whatever it names), moved:URL (the same as a 301).\n"
     "\n"
     "Log (--log-file): one JSON object per request and line. Notifications (--notifications-file):\n"
     "one JSON object per fence that fires. Credentials are never logged.\n"

@@ -7,7 +7,7 @@ namespace kyn::sim {
 
 namespace {
 
-constexpr const char* kForms = "status:CODE, slow:MS, reset, garbage, body:PATH, truncate or redirect:URL";
+constexpr const char* kForms = "status:CODE, slow:MS, reset, garbage, body:PATH, truncate, redirect:URL or moved:URL";
 
 long number(std::string_view digits, std::string_view fault) {
   long value = 0;
@@ -29,7 +29,7 @@ std::string Fault::describe() const {
     case Kind::Garbage: return "garbage";
     case Kind::Body: return "body:" + bodyPath.string();
     case Kind::Truncate: return "truncate";
-    case Kind::Redirect: return "redirect:" + location;
+    case Kind::Redirect: return (status == 301 ? "moved:" : "redirect:") + location;
   }
   return {};
 }
@@ -55,8 +55,9 @@ Fault parseFault(std::string_view text) {
   } else if (kind == "body" && hasArgument && !argument.empty()) {
     f.kind = Fault::Kind::Body;
     f.bodyPath = std::filesystem::path(std::string(argument));
-  } else if (kind == "redirect" && hasArgument && !argument.empty()) {
+  } else if ((kind == "redirect" || kind == "moved") && hasArgument && !argument.empty()) {
     f.kind = Fault::Kind::Redirect;
+    f.status = kind == "moved" ? 301 : 307;
     f.location = std::string(argument);
   } else if (!hasArgument && kind == "reset") {
     f.kind = Fault::Kind::Reset;

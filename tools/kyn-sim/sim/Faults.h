@@ -17,7 +17,7 @@ struct Fault {
     Garbage,   ///< HTTP 200 with random bytes that are no JSON
     Body,      ///< HTTP 200 with the bytes of `bodyPath`, read afresh for every request
     Truncate,  ///< announce more body bytes than are sent, then drop the connection
-    Redirect,  ///< 307 to `location`, whatever it names
+    Redirect,  ///< `status` (307, or 301 for "moved") to `location`, whatever it names
   };
   Kind kind = Kind::None;
   int status = 0;
@@ -29,8 +29,8 @@ struct Fault {
   [[nodiscard]] std::string describe() const;
 };
 
-/// Parses "status:CODE" (200 to 599), "slow:MS", "reset", "garbage", "body:PATH", "truncate" or
-/// "redirect:URL".
+/// Parses "status:CODE" (200 to 599), "slow:MS", "reset", "garbage", "body:PATH", "truncate",
+/// "redirect:URL" or "moved:URL".
 /// Throws std::invalid_argument with the accepted forms on anything else.
 [[nodiscard]] Fault parseFault(std::string_view text);
 

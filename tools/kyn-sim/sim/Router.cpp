@@ -46,11 +46,11 @@ Reply refusingBadRequests(Answer&& answer) {
   }
 }
 
-Reply redirectReply(std::string location) {
+Reply redirectReply(std::string location, int status = 307) {
   Reply r;
-  r.status = 307;
+  r.status = status;
   r.contentType = "text/plain";
-  r.body = "Temporary Redirect\n";
+  r.body = status == 301 ? "Moved Permanently\n" : "Temporary Redirect\n";
   r.headers.emplace_back("Location", std::move(location));
   return r;
 }
@@ -176,7 +176,7 @@ Router::FaultPlan Router::planFault() {
       plan.delivery = Reply::Delivery::Truncate;  // the real answer, cut short
       return plan;
     case Fault::Kind::Redirect:
-      r = redirectReply(f.location);
+      r = redirectReply(f.location, f.status);
       break;
   }
   plan.replaces = true;
