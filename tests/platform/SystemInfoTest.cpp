@@ -1,3 +1,4 @@
+#include "platform/fs/Files.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
 #include "support/PlatformTest.h"
 
@@ -82,6 +83,19 @@ TEST_F(SystemInfoTest, OnlyAPrivateRegularTokenFileIsRead) {
   fs::create_directory(configDir->path() / "token");
   EXPECT_FALSE(token());
   EXPECT_FALSE(log->contains("tok-123") || log->contains("tok-456"));
+}
+
+// A file's stamp tells a change without reading it, once the file had a second to settle.
+TEST_F(SystemInfoTest, AFileStampShowsEachChangeOnceSettled) {
+  const auto file = configDir->write("f", "one");
+  EXPECT_FALSE(FileStamp::of(file).settled);  // just written: a change within the same tick could hide
+  const std::time_t later = std::time(nullptr) + 2;
+  const auto first = FileStamp::of(file, later);
+  EXPECT_TRUE(FileStamp::of(file, later).unchangedSince(first));
+  configDir->write("f", "three");
+  EXPECT_FALSE(FileStamp::of(file, later).unchangedSince(first));
+  fs::remove(file);
+  EXPECT_FALSE(FileStamp::of(file, later).unchangedSince(first));
 }
 
 TEST_F(SystemInfoTest, DeviceFacts) {

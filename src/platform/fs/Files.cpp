@@ -1,6 +1,7 @@
 #include "platform/fs/Files.h"
 
 #include <fcntl.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
@@ -27,6 +28,17 @@ std::optional<std::string> readWholeFile(const std::filesystem::path& file, std:
   }
   ::close(fd);
   return text;
+}
+
+FileStamp FileStamp::of(const std::filesystem::path& file, std::time_t now) noexcept {
+  struct stat st {};
+  FileStamp stamp;
+  if (::stat(file.c_str(), &st) != 0) return stamp;
+  stamp.exists = true;
+  stamp.fields = {static_cast<std::int64_t>(st.st_dev), static_cast<std::int64_t>(st.st_ino), st.st_size,
+                  st.st_mtim.tv_sec, st.st_mtim.tv_nsec, st.st_ctim.tv_sec, st.st_ctim.tv_nsec};
+  stamp.settled = now - st.st_mtim.tv_sec > 1 && now - st.st_ctim.tv_sec > 1;
+  return stamp;
 }
 
 }  // namespace kyn::platform

@@ -116,13 +116,6 @@ std::filesystem::path FilePreferencesStore::fileForDomain(std::string_view domai
   return directory_ / (std::string(domain) + ".json");
 }
 
-FilePreferencesStore::FileStamp FilePreferencesStore::stampOf(const std::filesystem::path& file) noexcept {
-  struct stat st {};
-  if (::stat(file.c_str(), &st) != 0) return FileStamp{};
-  return FileStamp{true, static_cast<std::uintmax_t>(st.st_ino), static_cast<std::uintmax_t>(st.st_size),
-                   static_cast<long long>(st.st_mtim.tv_sec) * 1'000'000'000LL + st.st_mtim.tv_nsec};
-}
-
 Value FilePreferencesStore::readFile(const std::filesystem::path& file, bool logCorruption) {
   auto text = readWholeFile(file, kMaxFileBytes);
   if (!text) return Value::object();  // vanished between stat and open, or unreadable
@@ -143,8 +136,8 @@ FilePreferencesStore::Domain& FilePreferencesStore::domainNamed(std::string_view
 }
 
 void FilePreferencesStore::refresh(Domain& domain) {
-  const FileStamp stamp = stampOf(domain.file);
-  if (domain.stamp && *domain.stamp == stamp) return;
+  const FileStamp stamp = FileStamp::of(domain.file);
+  if (domain.stamp && stamp.unchangedSince(*domain.stamp)) return;
   domain.content = stamp.exists ? readFile(domain.file, true) : Value::object();
   domain.stamp = stamp;
 }
@@ -198,7 +191,7 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
     domain.swept = true;
   }
 
-  Value current = stampOf(file).exists ? readFile(file, false) : Value::object();
+  Value current = FileStamp::of(file).exists ? readFile(file, false) : Value::object();
   for (auto& [key, value] : domain.pending) {
     if (value) current[key] = *value;
     else current.erase(key);
@@ -218,7 +211,7 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
 
   domain.pending.clear();
   domain.content = std::move(current);
-  domain.stamp = stampOf(file);
+  domain.stamp = FileStamp::of(file);
   return true;
 }
 

@@ -1,8 +1,8 @@
 #pragma once
 
+#include "platform/fs/Files.h"
 #include "platform/prefs/PreferencesStore.h"
 
-#include <cstdint>
 #include <filesystem>
 #include <map>
 #include <mutex>
@@ -29,13 +29,6 @@ class FilePreferencesStore final : public PreferencesStore {
   [[nodiscard]] std::filesystem::path fileForDomain(std::string_view domain) const;
 
  private:
-  struct FileStamp {
-    bool exists = false;
-    std::uintmax_t inode = 0;
-    std::uintmax_t size = 0;
-    long long mtimeNs = 0;
-    bool operator==(const FileStamp&) const = default;
-  };
   struct Domain {
     std::filesystem::path file;
     std::optional<FileStamp> stamp;  // of the content below; nothing until first read
@@ -45,7 +38,6 @@ class FilePreferencesStore final : public PreferencesStore {
   };
 
   static bool isValidDomain(std::string_view domain) noexcept;
-  static FileStamp stampOf(const std::filesystem::path& file) noexcept;
   Value readFile(const std::filesystem::path& file, bool logCorruption);
   /// The domain's state, made on first use; the caller holds the lock.
   Domain& domainNamed(std::string_view domainName);

@@ -66,16 +66,13 @@ std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, c
 }  // namespace
 
 std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
-  std::error_code ec;
-  if (!std::filesystem::exists(file, ec)) return std::nullopt;
-  auto text = readWholeFile(file, kMaxAccountBytes);
-  if (!text) {
-    Log::shared().error("Account file %@ cannot be read or is too large; no account is signed in", file.string());
-    return std::nullopt;
-  }
-  // Every command reads the account afresh; the text is parsed again only when it changed.
+  // Every command reads the account afresh; a file whose stamp is unchanged is not read again, and
+  // a text is parsed again only when it changed.
+  const FileStamp stamp = FileStamp::of(file);
+  if (!stamp.exists) return std::nullopt;
   struct Parsed {
     std::filesystem::path path;
+    FileStamp stamp;
     std::string text;
     std::optional<AccountFile> account;
   };
@@ -83,11 +80,23 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   static std::optional<Parsed> last;
   {
     std::lock_guard lock(mutex);
-    if (last && last->path == file && last->text == *text) return last->account;
+    if (last && last->path == file && stamp.unchangedSince(last->stamp)) return last->account;
+  }
+  auto text = readWholeFile(file, kMaxAccountBytes);
+  if (!text) {
+    Log::shared().error("Account file %@ cannot be read or is too large; no account is signed in", file.string());
+    return std::nullopt;
+  }
+  {
+    std::lock_guard lock(mutex);
+    if (last && last->path == file && last->text == *text) {
+      last->stamp = stamp;
+      return last->account;
+    }
   }
   auto account = parseAccountFile(file, *text);
   std::lock_guard lock(mutex);
-  last = Parsed{file, std::move(*text), account};
+  last = Parsed{file, stamp, std::move(*text), account};
   return account;
 }
 
