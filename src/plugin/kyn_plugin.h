@@ -38,7 +38,8 @@ void kyn_plugin_set_log_callback(kyn_log_callback callback, void* context);
 
 /* Performs an assistant command given as JSON, {"class": "AXKynSearch", ...}. Returns 0 when it was
  * taken: `reply` is then called exactly once, before this function returns (a command that does not
- * parse, names an unknown class or fails validation) or later on the plug-in's network thread.
+ * parse or is over 1 MiB, names an unknown class or fails validation) or later on the plug-in's
+ * network thread.
  * Returns -1, and never calls `reply`, only when `command_json` or `reply` is NULL. */
 int kyn_plugin_perform(const char* command_json, kyn_reply_callback reply, void* context);
 

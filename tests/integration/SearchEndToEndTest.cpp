@@ -118,14 +118,17 @@ TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewH
 
 TEST_F(SearchEndToEnd, ACommandThatDoesNotParseIsAnsweredOnceAtOnce) {
   start();
-  // A visibility or geofence command without its flag would hide the user or switch a fence off.
-  for (const char* bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE",
-                          R"({"class":"AXKynVisibilityStateSet"})", R"({"class":"AXKynVisibilityStateSet","visible":"yes"})",
-                          R"({"class":"AXKynGeoFenceSet","geoFenceTrigger":"OnArrival",)"
-                          R"("friend":{"class":"AXPerson","emails":[{"emailAddress":"ada@example.com"}]}})"}) {
+  // A visibility or geofence command without its flag would hide the user or switch a fence off. A
+  // command over 1 MiB is not read at all.
+  const std::string tooLong = searchFor({"ada@example.com"}) + std::string(1u << 20, ' ');
+  for (const std::string bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE",
+                                R"({"class":"AXKynVisibilityStateSet"})", R"({"class":"AXKynVisibilityStateSet","visible":"yes"})",
+                                R"({"class":"AXKynGeoFenceSet","geoFenceTrigger":"OnArrival",)"
+                                R"("friend":{"class":"AXPerson","emails":[{"emailAddress":"ada@example.com"}]}})",
+                                tooLong.c_str()}) {
     const auto outcome = plugin->perform(bad, std::chrono::seconds(1));
-    EXPECT_EQ(outcome.replies, 1) << bad;
-    ASSERT_TRUE(outcome.reply) << bad;
+    EXPECT_EQ(outcome.replies, 1) << bad.substr(0, 80);
+    ASSERT_TRUE(outcome.reply) << bad.substr(0, 80);
     EXPECT_EQ((*outcome.reply)["class"], "AXCommandFailed");
     EXPECT_TRUE(outcome.reply->contains("reason"));
   }

@@ -32,6 +32,9 @@ TEST_F(PreferencesStoreTest, OtherStoresSeeAValueOnceItIsSynchronisedAndRemovalD
   writer.setValue("d", "host", Value("b.example"));
   ASSERT_TRUE(writer.synchronize("d"));
   EXPECT_EQ(reader.value("d", "host"), Value("b.example"));  // re-read when the file changed
+  reader.setValue("d", "host", Value("c.example"));
+  ASSERT_TRUE(reader.synchronize("d"));
+  EXPECT_EQ(writer.value("d", "host"), Value("c.example"));  // its own synchronised value no longer shadows it
   writer.setValue("d", "host", std::nullopt);
   ASSERT_TRUE(writer.synchronize("d"));
   EXPECT_FALSE(FilePreferencesStore(dir()).value("d", "host"));

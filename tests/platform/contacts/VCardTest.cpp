@@ -87,7 +87,7 @@ TEST(VCardLines, Utf16InEitherOrderAndUtf8WithByteOrderMarks) {
   // The CHARSET of a plain value no longer applies once the text is UTF-16; a quoted-printable one's does.
   const std::u16string text =
       u"\uFEFFBEGIN:VCARD\r\nFN;CHARSET=ISO-8859-1:Zo\u00EB \U0001F600\r\n"
-      u"N;ENCODING=QUOTED-PRINTABLE;CHARSET=ISO-8859-1:M=FCller\r\nEND:VCARD\r\n";
+      u"N;ENCODING=QUOTED-PRINTABLE;CHARSET=ISO-8859-1:M=FCller;Ada\r\nEND:VCARD\r\n";
   for (const bool bigEndian : {false, true}) {
     for (const bool mark : {true, false}) {
       SCOPED_TRACE(std::string(bigEndian ? "big" : "little") + (mark ? " endian with mark" : " endian without"));
