@@ -118,8 +118,7 @@ TEST_F(SearchEndToEnd, AfterARedirectEveryCommandAndEveryNewProcessGoesToTheNewH
 
 TEST_F(SearchEndToEnd, ACommandThatDoesNotParseIsAnsweredOnceAtOnce) {
   start();
-  // A visibility or geofence command without its flag would hide the user or switch a fence off. A
-  // command over 1 MiB is not read at all.
+  // A visibility or geofence command without its flag would hide the user or switch a fence off.
   const std::string tooLong = searchFor({"ada@example.com"}) + std::string(1u << 20, ' ');
   for (const std::string bad : {"{\"class\":", "[]", "{\"class\":\"AXKynNothing\"}", "{}", "\xFF\xFE",
                                 R"({"class":"AXKynVisibilityStateSet"})", R"({"class":"AXKynVisibilityStateSet","visible":"yes"})",

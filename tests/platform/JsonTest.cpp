@@ -69,7 +69,6 @@ TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
   EXPECT_EQ(written, "\"\\u0001\xEF\xBF\xBD\"");
 }
 
-// The readers give the same answers on a tree and on a parsed document read in place.
 TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
   const std::string text =
       R"({"s":"x","n":7.9,"neg":-3.2,"b":true,"null":null,"big":1e300,"edge":9.223372036854775808e18,)"
@@ -88,6 +87,7 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     EXPECT_TRUE(v.member("null").isNull());
     EXPECT_FALSE(v.memberNotNull("null"));
     EXPECT_FALSE(numberValue(v.member("b")));
+    EXPECT_TRUE(v.member("i").isInteger() && !v.member("n").isInteger());
     EXPECT_EQ(boolValue(v.member("neg")), true);
     EXPECT_FALSE(stringValue(v.member("n")));
     EXPECT_FALSE(v.member("a").member("k"));
@@ -96,6 +96,7 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     EXPECT_EQ(items, (std::vector<std::string>{"1", R"({"k":2})", R"("z")"}));
     EXPECT_EQ(v.toValue(), tree);
     EXPECT_EQ(toJson(v.member("a")), R"([1,{"k":2},"z"])");
+    EXPECT_EQ(toJson(v.member("a"), 1), toJson(tree["a"], 1));  // indented as a tree would be
     EXPECT_EQ(toJson(v.member("neg")), "-3.2");
   }
   EXPECT_EQ(member(nullptr, "s"), nullptr);

@@ -123,6 +123,7 @@ TEST_F(PreferencesStoreTest, DomainsThatAreNoFileNamesAreRefused) {
     EXPECT_FALSE(store.value(bad, "k")) << bad;
     EXPECT_FALSE(store.synchronize(bad)) << bad;
   }
+  EXPECT_EQ(log->messages(LogLevel::Error).size(), 6u);  // each refused value is reported
   EXPECT_FALSE(std::filesystem::exists(configDir->path() / "escape.json"));
   const std::string longest(200, 'd');
   store.setValue(longest, "k", Value(1));
