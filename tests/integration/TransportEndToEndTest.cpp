@@ -143,9 +143,8 @@ TEST(TransportEndToEnd, ARedirectCountsOnlyWhenTheNewHostAnswered) {
     long maxRedirects = 5;
   };
   const std::vector<Case> cases = {
-      // The POST survives a 301: curl would otherwise turn it into a GET, which kyn-sim refuses.
-      {.name = "moved for good", .simArgs = {"--fault", "moved:" + toTarget}, .expected = KYTransferError::None,
-       .counts = true},
+      {.name = "moved for good (301), the POST kept", .simArgs = {"--fault", "moved:" + toTarget},
+       .expected = KYTransferError::None, .counts = true},
       {.name = "to a closed port",
        .simArgs = {"--fault", "redirect:https://" + kNothingListens + kPath},
        .expected = KYTransferError::Refused},

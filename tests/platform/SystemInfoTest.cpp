@@ -41,7 +41,8 @@ TEST_F(SystemInfoTest, AccountFilesThatNameNoOne) {
   EXPECT_FALSE(info().ownerAccount());  // missing: no error
   EXPECT_FALSE(fileSession.isProvisionedForLocationSharing() || fileSession.isRestricted());
   EXPECT_TRUE(log->messages(LogLevel::Error).empty());
-  for (const char* text : {"", "{", "[]", "null", "{\"personId\": 12"}) {
+  const std::string tooLarge = R"({"personId":"P7","pad":")" + std::string(64 * 1024, ' ') + "\"}";
+  for (const char* text : {"", "{", "[]", "null", "{\"personId\": 12", tooLarge.c_str()}) {
     configDir->write("account.json", text);
     EXPECT_FALSE(info().ownerAccount()) << text;
   }
@@ -51,7 +52,7 @@ TEST_F(SystemInfoTest, AccountFilesThatNameNoOne) {
   ASSERT_TRUE(account);
   EXPECT_FALSE(account->personId() || account->username() || account->hostNameOfType(0));
   EXPECT_FALSE(fileSession.isProvisionedForLocationSharing());
-  EXPECT_EQ(log->messages(LogLevel::Error).size(), 5u + 3u);  // each bad file, each field of the wrong type
+  EXPECT_EQ(log->messages(LogLevel::Error).size(), 6u + 3u);  // each bad file, each field of the wrong type
 
   // The session flags default to provisioned and unrestricted.
   configDir->write("account.json", R"({"personId":"P7"})");

@@ -191,7 +191,7 @@ bool FilePreferencesStore::synchronize(std::string_view domainName) {
     domain.swept = true;
   }
 
-  Value current = FileStamp::of(file).exists ? readFile(file, false) : Value::object();
+  Value current = readFile(file, false);  // a missing file reads as empty
   for (auto& [key, value] : domain.pending) {
     if (value) current[key] = *value;
     else current.erase(key);

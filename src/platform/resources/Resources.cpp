@@ -5,7 +5,6 @@
 
 #include <dlfcn.h>
 
-
 namespace kyn::platform {
 
 std::optional<std::filesystem::path> resourceDirectory() {
