@@ -55,18 +55,19 @@ TEST(Json, BoundsDepthAndSize) {
   EXPECT_FALSE(parseJson("[1,2,3,4]", limits));
 }
 
-TEST(Json, SerialisingInvalidUtf8ReplacesItInsteadOfThrowing) {
+TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   Value v = Value::object();
   v["name"] = std::string("bad \xFF byte");
   const std::string text = toJson(v);
   EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
   EXPECT_TRUE(parseJson(text));
-  std::string written;
-  appendJsonString(written, "a\x01" "b\x1F");
-  EXPECT_EQ(written, "\"a\\u0001b\\u001f\"");
-  written.clear();
-  appendJsonString(written, "\x01\x80");  // 0x80: the lowest byte that is no ASCII
-  EXPECT_EQ(written, "\"\\u0001\xEF\xBF\xBD\"");
+  // 0x1F and 0x80: the last control character and the lowest byte that is no ASCII.
+  for (const auto& [input, expected] : std::vector<std::pair<std::string, std::string>>{
+           {"a\x01" "b\x1F", R"("a\u0001b\u001f")"}, {"a\"b\\ ~", R"("a\"b\\ ~")"}, {"a\x80", "\"a\xEF\xBF\xBD\""}}) {
+    std::string written;
+    appendJsonString(written, input);
+    EXPECT_EQ(written, expected);
+  }
 }
 
 TEST(Json, ValueReadersReadATreeAndADocumentAlike) {

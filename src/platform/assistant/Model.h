@@ -9,10 +9,12 @@
 #include "platform/value/Json.h"
 #include "platform/value/Value.h"
 
+#include <algorithm>
 #include <array>
 #include <cmath>
 #include <cstdlib>
 #include <cstdint>
+#include <cstring>
 #include <functional>
 #include <memory>
 #include <optional>
@@ -68,7 +70,7 @@ namespace detail {
 struct FieldCounter {
   std::size_t count = 0;
   template <class T>
-  void operator()(const char* /*key*/, const T& /*v*/) {
+  void operator()(std::string_view /*key*/, const T& /*v*/) {
     ++count;
   }
 };
@@ -78,24 +80,24 @@ struct FieldCounter {
 struct FieldWriter {
   Value::object_t::Container& out;
 
-  void operator()(const char* key, const std::optional<std::string>& v) const {
+  void operator()(std::string_view key, const std::optional<std::string>& v) const {
     if (v) out.emplace_back(key, *v);
   }
-  void operator()(const char* key, const std::optional<double>& v) const {
+  void operator()(std::string_view key, const std::optional<double>& v) const {
     if (v && std::isfinite(*v)) out.emplace_back(key, *v);  // JSON cannot carry NaN or infinity
   }
-  void operator()(const char* key, const std::optional<bool>& v) const {
+  void operator()(std::string_view key, const std::optional<bool>& v) const {
     if (v) out.emplace_back(key, *v);
   }
-  void operator()(const char* key, const std::optional<std::int64_t>& v) const {
+  void operator()(std::string_view key, const std::optional<std::int64_t>& v) const {
     if (v) out.emplace_back(key, *v);
   }
   template <class T>
-  void operator()(const char* key, const std::shared_ptr<T>& v) const {
+  void operator()(std::string_view key, const std::shared_ptr<T>& v) const {
     if (v) out.emplace_back(key, v->dictionary());
   }
   template <class T>
-  void operator()(const char* key, const AXArray<T>& v) const {
+  void operator()(std::string_view key, const AXArray<T>& v) const {
     if (!v) return;
     Value array = Value::array();
     array.get_ref<Value::array_t&>().reserve(v->size());
@@ -111,39 +113,45 @@ struct FieldWriter {
 struct FieldJsonWriter {
   std::string& out;
 
-  void key(const char* key) const {
-    out += ",\"";
-    out += key;
-    out += "\":";
+  /// `,"key":`, made in one step.
+  void key(std::string_view k) const {
+    char text[64];  // the keys are field names, a few letters each
+    const std::size_t n = std::min(k.size(), sizeof text - 4);
+    text[0] = ',';
+    text[1] = '"';
+    std::memcpy(text + 2, k.data(), n);
+    text[n + 2] = '"';
+    text[n + 3] = ':';
+    out.append(text, n + 4);
   }
-  void operator()(const char* k, const std::optional<std::string>& v) const {
+  void operator()(std::string_view k, const std::optional<std::string>& v) const {
     if (!v) return;
     key(k);
     platform::appendJsonString(out, *v);
   }
-  void operator()(const char* k, const std::optional<double>& v) const {
+  void operator()(std::string_view k, const std::optional<double>& v) const {
     if (!v || !std::isfinite(*v)) return;
     key(k);
     platform::appendJsonNumber(out, *v);
   }
-  void operator()(const char* k, const std::optional<bool>& v) const {
+  void operator()(std::string_view k, const std::optional<bool>& v) const {
     if (!v) return;
     key(k);
     out += *v ? "true" : "false";
   }
-  void operator()(const char* k, const std::optional<std::int64_t>& v) const {
+  void operator()(std::string_view k, const std::optional<std::int64_t>& v) const {
     if (!v) return;
     key(k);
     platform::appendJsonNumber(out, *v);
   }
   template <class T>
-  void operator()(const char* k, const std::shared_ptr<T>& v) const {
+  void operator()(std::string_view k, const std::shared_ptr<T>& v) const {
     if (!v) return;
     key(k);
     v->appendJson(out);
   }
   template <class T>
-  void operator()(const char* k, const AXArray<T>& v) const {
+  void operator()(std::string_view k, const AXArray<T>& v) const {
     if (!v) return;
     key(k);
     out += '[';
@@ -164,7 +172,7 @@ struct FieldNames {
   std::size_t count = 0;
   std::size_t room;
   template <class T>
-  void operator()(const char* key, const T& /*v*/) {
+  void operator()(std::string_view key, const T& /*v*/) {
     if (count < room) names[count] = key;
     ++count;
   }
@@ -200,23 +208,23 @@ struct FieldReader {
   std::size_t next = 0;
 
   platform::JsonView take() { return found[next++]; }
-  void operator()(const char* /*key*/, std::optional<std::string>& v) { v = platform::stringValue(take()); }
-  void operator()(const char* /*key*/, std::optional<double>& v) {
+  void operator()(std::string_view /*key*/, std::optional<std::string>& v) { v = platform::stringValue(take()); }
+  void operator()(std::string_view /*key*/, std::optional<double>& v) {
     auto n = platform::numberValue(take());
     v = (n && std::isfinite(*n)) ? n : std::nullopt;
   }
-  void operator()(const char* /*key*/, std::optional<bool>& v) { v = platform::boolValue(take()); }
-  void operator()(const char* /*key*/, std::optional<std::int64_t>& v) {
+  void operator()(std::string_view /*key*/, std::optional<bool>& v) { v = platform::boolValue(take()); }
+  void operator()(std::string_view /*key*/, std::optional<std::int64_t>& v) {
     const platform::JsonView m = take();
     v = m.isNumber() ? std::optional<std::int64_t>(platform::integerValue(m)) : std::nullopt;
   }
   template <class T>
-  void operator()(const char* /*key*/, std::shared_ptr<T>& v) {
+  void operator()(std::string_view /*key*/, std::shared_ptr<T>& v) {
     const platform::JsonView m = take();
     v = m.isObject() ? T::fromDictionary(m) : nullptr;
   }
   template <class T>
-  void operator()(const char* /*key*/, AXArray<T>& v) {
+  void operator()(std::string_view /*key*/, AXArray<T>& v) {
     const platform::JsonView m = take();
     if (!m.isArray()) {
       v.reset();
@@ -253,9 +261,16 @@ class AXRecord : public AXObject {
   }
 
   void appendJson(std::string& out) const override {
-    out += "{\"class\":\"";
-    out += Derived::kClassName;  // a plain identifier
-    out += '"';
+    // `{"class":"<name>"`, made in one step; the name is a plain identifier.
+    static constexpr auto header = [] {
+      constexpr std::string_view open = "{\"class\":\"";
+      std::array<char, open.size() + Derived::kClassName.size() + 1> text{};
+      std::copy(open.begin(), open.end(), text.begin());
+      std::copy(Derived::kClassName.begin(), Derived::kClassName.end(), text.begin() + open.size());
+      text.back() = '"';
+      return text;
+    }();
+    out.append(header.data(), header.size());
     detail::FieldJsonWriter writer{out};
     Derived::fields(static_cast<const Derived&>(*this), writer);
     out += '}';
