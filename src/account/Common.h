@@ -83,6 +83,8 @@ class Common {
   /// The server handles of a person: its completed phone numbers (or, when it brought none, its
   /// contact's), then its e-mail addresses as they stand. Duplicates are kept.
   [[nodiscard]] std::vector<std::string> handlesForAXPerson(const AXPerson& person) const;
+  /// The same handles, appended to `handles`.
+  void appendHandlesForAXPerson(const AXPerson& person, std::vector<std::string>& handles) const;
   /// A raw phone number in canonical form: leading junk cut, then read in the default country;
   /// the cut text when it is no phone number; nothing for nothing.
   [[nodiscard]] std::optional<std::string> completeNumberForPhoneNumber(const std::optional<std::string>& raw) const;

@@ -38,6 +38,12 @@ std::optional<std::string> Common::completeNumberForPhoneNumber(const std::optio
 
 std::vector<std::string> Common::handlesForAXPerson(const AXPerson& person) const {
   std::vector<std::string> handles;
+  appendHandlesForAXPerson(person, handles);
+  return handles;
+}
+
+void Common::appendHandlesForAXPerson(const AXPerson& person, std::vector<std::string>& handles) const {
+  const std::size_t first = handles.size();
   if (person.phones) {
     for (const auto& phone : *person.phones) {
       if (!phone) continue;
@@ -45,7 +51,7 @@ std::vector<std::string> Common::handlesForAXPerson(const AXPerson& person) cons
     }
   }
   // The contact's numbers stand in only when the person brought none of its own.
-  if (handles.empty()) {
+  if (handles.size() == first) {
     const auto contact = ContactsUtilities::contactForAssistantId(person.identifier);
     for (const auto& number : ContactsUtilities::phoneNumbersForContact(contact)) {
       if (auto completed = completeNumberForPhoneNumber(number)) handles.push_back(std::move(*completed));
@@ -57,7 +63,6 @@ std::vector<std::string> Common::handlesForAXPerson(const AXPerson& person) cons
       if (email && email->emailAddress) handles.push_back(*email->emailAddress);
     }
   }
-  return handles;
 }
 
 }  // namespace kyn

@@ -19,11 +19,10 @@ std::string GetLocationsCmd::path() const { return std::string(KYNUrlBase) + "ge
 std::optional<std::vector<std::string>> GetLocationsCmd::allFriendsHandles() const {
   if (!friends) return std::nullopt;
   std::vector<std::string> handles;
+  handles.reserve(friends->size());
   Common& common = Common::sharedInstance();
   for (const auto& person : *friends) {
-    if (!person) continue;
-    auto own = common.handlesForAXPerson(*person);
-    handles.insert(handles.end(), std::make_move_iterator(own.begin()), std::make_move_iterator(own.end()));
+    if (person) common.appendHandlesForAXPerson(*person, handles);
   }
   return handles;
 }
@@ -128,6 +127,7 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
   }
   std::unordered_map<std::string_view, std::shared_ptr<AXPerson>> personForHandle;
   if (friends) {
+    personForHandle.reserve(friends->size());
     for (const auto& person : *friends) {
       if (!person) continue;
       // The first friend that holds a handle, as e-mail address or as phone number, wins.
@@ -151,8 +151,8 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
     if (platform::integerValue(entry.member("status")) == 411) return;  // not a friend: left out
     const auto personIt = personForHandle.find(handle);
     auto person = personIt == personForHandle.end() ? nullptr : personIt->second;
-    auto record = KYNAXLocation::locationWithHandle(std::string(handle), std::move(person), entry);
-    if (record->avixLocation) found.push_back(record->avixLocation);
+    KYNAXLocation record(std::string(handle), std::move(person), entry);
+    if (record.avixLocation) found.push_back(std::move(record.avixLocation));
     atRequestedLocation = platform::boolValue(entry.member("match")).value_or(false);
   };
 

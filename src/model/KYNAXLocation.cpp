@@ -27,9 +27,9 @@ platform::JsonView objectMember(platform::JsonView object, std::string_view key)
 
 }  // namespace
 
-KYNAXLocation::KYNAXLocation(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
+KYNAXLocation::KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
                              platform::JsonView entry) {
-  decodeHandle(handle, std::move(person), entry);
+  decodeHandle(std::move(handle), std::move(person), entry);
 }
 
 KYNAXLocation::KYNAXLocation(std::shared_ptr<AXKynLocation> location) : avixLocation(std::move(location)) {}
@@ -49,7 +49,7 @@ std::shared_ptr<platform::NumberFormatting> KYNAXLocation::numberFormatter() {
 
 std::shared_ptr<platform::Localization> KYNAXLocation::bundle() { return services().localization.get(); }
 
-void KYNAXLocation::decodeHandle(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person,
+void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
                                  platform::JsonView entry) {
   auto location = std::make_shared<AXKynLocation>();
   avixLocation = location;
@@ -62,7 +62,7 @@ void KYNAXLocation::decodeHandle(const std::optional<std::string>& handle, std::
 
   auto attribute = std::make_shared<AXPersonAttribute>();
   attribute->object = person;
-  attribute->data = handle;
+  attribute->data = std::move(handle);
   location->friend_ = attribute;
 
   if (const platform::JsonView distance = entry.member("distanceInMeters")) {

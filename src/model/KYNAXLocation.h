@@ -20,7 +20,7 @@ class KYNAXLocation : public KYNAXBaseModel {
  public:
   /// Decodes `entry` (a friend location entry, or nothing) for `handle`; without a person, one is
   /// built from the contacts.
-  KYNAXLocation(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
+  KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
   /// Wraps an assistant location as it is: nothing decoded, no person looked up.
   explicit KYNAXLocation(std::shared_ptr<AXKynLocation> avixLocation);
   ~KYNAXLocation() override = default;
@@ -31,7 +31,7 @@ class KYNAXLocation : public KYNAXBaseModel {
   [[nodiscard]] static std::shared_ptr<KYNAXLocation> locationWithAvixLocation(std::shared_ptr<AXKynLocation> location);
 
   /// Replaces `avixLocation` with one decoded from `entry`. Values of the wrong type read as absent.
-  void decodeHandle(const std::optional<std::string>& handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
+  void decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
 
   /// Latitude and longitude are both present (zero counts as present).
   [[nodiscard]] bool hasCoordinate() const;
