@@ -1,6 +1,6 @@
 #include "platform/log/Log.h"
 
-
+#include <syslog.h>
 #include <systemd/sd-journal.h>
 
 #include <cstdio>
@@ -24,13 +24,11 @@ class JournalLogSink final : public LogSink {
  private:
   static int priority(LogLevel level) noexcept {
     switch (level) {
-      case LogLevel::Debug: return 7;
-      case LogLevel::Info: return 6;
-      case LogLevel::Default: return 5;
-      case LogLevel::Error:
-      case LogLevel::Off: return 3;
+      case LogLevel::Debug: return LOG_DEBUG;
+      case LogLevel::Info: return LOG_INFO;
+      case LogLevel::Default: return LOG_NOTICE;
+      default: return LOG_ERR;  // errors (a line at "off" is never written)
     }
-    return 5;
   }
 };
 
