@@ -116,7 +116,11 @@ struct FieldJsonWriter {
   /// `,"key":`, made in one step.
   void key(std::string_view k) const {
     char text[64];  // the keys are field names, a few letters each
-    const std::size_t n = std::min(k.size(), sizeof text - 4);
+    const std::size_t n = k.size();
+    if (n + 4 > sizeof text) {
+      out.append(",\"").append(k).append("\":");
+      return;
+    }
     text[0] = ',';
     text[1] = '"';
     std::memcpy(text + 2, k.data(), n);
