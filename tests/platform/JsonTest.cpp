@@ -12,6 +12,10 @@ TEST(Json, ParsesDocumentsKeepingKeyOrder) {
   std::vector<std::string> keys;
   for (const auto& [k, _] : v->items()) keys.push_back(k);
   EXPECT_EQ(keys, (std::vector<std::string>{"z", "a", "m"}));
+  // A document given a new text by assignment reads as the new one.
+  auto document = parseJsonDocument(R"({"z":1})").value();
+  document = parseJsonDocument("[2]").value();
+  EXPECT_EQ(toJson(document.root()), "[2]");
 }
 
 TEST(Json, DuplicateKeysKeepTheLastValueAtTheFirstPosition) {

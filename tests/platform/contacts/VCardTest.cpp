@@ -189,7 +189,7 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
       "URL:http\\://example.com/a\\,b\r\n"
       "ORG:Acme\\; Sons;Research;Lab 2\r\n"
       "ADR;TYPE=HOME:PO 7;Apt 3;12 Elm St\\nBack door;Springfield;OR;97400;Testland\r\n"
-      "ADR:;;;Lakeview\r\n"  // trailing empty components left out
+      "ADR:;;;Lakeview;;97401\r\n"  // trailing empty components left out
       "ADR:;;;;;;\r\n"
       "ADR:;;1 Main St;;;;;Extra;More\r\n"
       "NICKNAME:\tAl\\n\r\n"));  // blanks and line breaks around a value go, also escaped ones
@@ -206,7 +206,7 @@ TEST(VCardProperties, EscapesAndStructuredValues) {
   // Address components in label order; empty ones leave no blank lines; an empty address is none;
   // components past the seventh join the country.
   EXPECT_EQ(c.postalAddresses, (Labeled{{"home", "PO 7\nApt 3\n12 Elm St\nBack door\nSpringfield, OR 97400\nTestland"},
-                                        {std::nullopt, "Lakeview"},
+                                        {std::nullopt, "Lakeview, 97401"},
                                         {std::nullopt, "1 Main St\nExtra More"}}));
 }
 
