@@ -108,7 +108,10 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
       {.name = "shut down", .simArgs = {"--fault", "slow:20000"}, .expected = KYTransferError::Cancelled,
        .cutShort = true},
   };
+  const auto log = std::make_shared<platform::CaptureLogSink>();
+  const auto previousSink = platform::Log::shared().setSink(log);
   for (const auto& c : cases) {
+    log->clear();
     test::TempDir dir;
     Sim sim(dir.path(), kNoFriends, c.simArgs);
     platform::TransportSettings settings;
@@ -125,7 +128,10 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
       EXPECT_EQ(command.response() ? command.response()->statusCode : 0, *c.http) << c.name;
     }
     EXPECT_FALSE(command.wasRedirected()) << c.name;
+    EXPECT_EQ(log->contains(std::string("failed: ") + std::string(describeTransferError(c.expected))),
+              c.expected != KYTransferError::None) << c.name;  // the log says why
   }
+  platform::Log::shared().setSink(previousSink);
 }
 
 // The host a server redirects to is stored and serves every later command, so a redirect counts (and

@@ -12,7 +12,6 @@ TEST(Json, ParsesDocumentsKeepingKeyOrder) {
   std::vector<std::string> keys;
   for (const auto& [k, _] : v->items()) keys.push_back(k);
   EXPECT_EQ(keys, (std::vector<std::string>{"z", "a", "m"}));
-  // A document given a new text by assignment reads as the new one.
   auto document = parseJsonDocument(R"({"z":1})").value();
   document = parseJsonDocument("[2]").value();
   EXPECT_EQ(toJson(document.root()), "[2]");
@@ -65,13 +64,10 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   const std::string text = toJson(v);
   EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
   EXPECT_TRUE(parseJson(text));
-  // 0x1F and 0x80: the last control character and the lowest byte that is no ASCII.
-  for (const auto& [input, expected] : std::vector<std::pair<std::string, std::string>>{
-           {"a\x01" "b\x1F", R"("a\u0001b\u001f")"}, {"a\"b\\ ~", R"("a\"b\\ ~")"}, {"a\x80", "\"a\xEF\xBF\xBD\""}}) {
-    std::string written;
-    appendJsonString(written, input);
-    EXPECT_EQ(written, expected);
-  }
+  const auto written = [](std::string_view input) { std::string out; appendJsonString(out, input); return out; };
+  EXPECT_EQ(written("a\x01" "b\x1F"), R"("a\u0001b\u001f")");  // 0x1F: the last control character
+  EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
+  EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
 }
 
 TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
@@ -92,7 +88,7 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     EXPECT_TRUE(v.member("null").isNull());
     EXPECT_FALSE(v.memberNotNull("null"));
     EXPECT_FALSE(numberValue(v.member("b")));
-    EXPECT_TRUE(v.member("i").isInteger() && !v.member("n").isInteger());
+    EXPECT_TRUE(v.member("i").isInteger() && !v.member("n").isInteger() && v.member("u").isNumber());
     EXPECT_EQ(boolValue(v.member("neg")), true);
     EXPECT_FALSE(stringValue(v.member("n")));
     EXPECT_FALSE(v.member("a").member("k"));
