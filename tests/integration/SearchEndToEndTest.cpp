@@ -123,12 +123,11 @@ TEST_F(SearchEndToEnd, ACommandThatDoesNotParseIsAnsweredOnceAtOnce) {
   // A visibility or geofence command without its flag would hide the user or switch a fence off.
   const std::string tooLong = searchFor({"ada@example.com"}) + std::string(1u << 20, ' ');
   const std::string notJson = "The command is not a JSON object";
-  const std::string visibleNeeded = R"(The visibility command needs "visible": true or false)";
   for (const auto& [bad, reason] : std::vector<std::pair<std::string, std::string>>{
            {"{\"class\":", notJson}, {"[]", notJson}, {"\xFF\xFE", notJson}, {tooLong, notJson},
            {"{\"class\":\"AXKynNothing\"}", "Unknown command class: AXKynNothing"}, {"{}", "The command names no class"},
-           {R"({"class":"AXKynVisibilityStateSet"})", visibleNeeded},
-           {R"({"class":"AXKynVisibilityStateSet","visible":"yes"})", visibleNeeded},
+           {R"({"class":"AXKynVisibilityStateSet"})", R"(The visibility command needs "visible": true or false)"},
+           {R"({"class":"AXKynVisibilityStateSet","visible":"yes"})", R"(The visibility command needs "visible": true or false)"},
            {R"({"class":"AXKynGeoFenceSet","geoFenceTrigger":"OnArrival",)"
             R"("friend":{"class":"AXPerson","emails":[{"emailAddress":"ada@example.com"}]}})",
             R"(The geofence command needs "enable": true or false)"}}) {
