@@ -52,7 +52,7 @@ TEST_F(HandlesTest, WithoutPhonesOfItsOwnThePersonsContactLendsItsNumbers) {
   contact.phoneNumbers = {{"mobile", "(503) 555-0101"}, {"work", "+44 20 7946 0018"}};
   auto p = test::makePerson({"Ada@Example.com"}, {});
   p->identifier = platform::assistantIdentifierForContactIdentifier("ada-1");
-  std::vector<std::string> handles{"+15035550100"};  // an earlier friend's do not count as its own
+  std::vector<std::string> handles{"+15035550100"};  // an earlier friend's handle is not its own
   common.appendHandlesForAXPerson(*p, handles);
   EXPECT_EQ(handles, (std::vector<std::string>{"+15035550100", "+15035550101", "+442079460018", "Ada@Example.com"}));
   // A phone entry without a number brings nothing, so the contact still lends its numbers.

@@ -115,18 +115,16 @@ struct FieldJsonWriter {
 
   /// `,"key":`, made in one step.
   void key(std::string_view k) const {
-    char text[64];  // the keys are field names, a few letters each
-    const std::size_t n = k.size();
-    if (n + 4 > sizeof text) {
-      out.append(",\"").append(k).append("\":");
-      return;
-    }
+    char text[64];
+    // Keys are field names of a few letters; a longer one is a programming error that the first
+    // text of its record shows, as with FieldKeys.
+    if (k.size() + 4 > sizeof text) std::abort();
     text[0] = ',';
     text[1] = '"';
-    std::memcpy(text + 2, k.data(), n);
-    text[n + 2] = '"';
-    text[n + 3] = ':';
-    out.append(text, n + 4);
+    std::memcpy(text + 2, k.data(), k.size());
+    text[k.size() + 2] = '"';
+    text[k.size() + 3] = ':';
+    out.append(text, k.size() + 4);
   }
   void operator()(std::string_view k, const std::optional<std::string>& v) const {
     if (!v) return;

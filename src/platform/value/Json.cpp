@@ -362,18 +362,19 @@ constexpr std::array<bool, UCHAR_MAX + 1> kPlainBytes = [] {
 }  // namespace
 
 void appendJsonString(std::string& out, std::string_view text) {
-  // Most texts are plain ASCII: they are copied between their quotes in one step.
-  if (std::all_of(text.begin(), text.end(), [](char c) { return kPlainBytes[static_cast<unsigned char>(c)]; })) {
-    out += '"';
+  // Most texts are plain ASCII: they are copied between their quotes in one step. Of the others,
+  // the plain start is not looked at again.
+  const auto special = std::find_if(text.begin(), text.end(), [](char c) { return !kPlainBytes[static_cast<unsigned char>(c)]; });
+  const std::size_t start = out.size();
+  out += '"';
+  if (special == text.end()) {
     out.append(text);
     out += '"';
     return;
   }
-  const std::size_t start = out.size();
-  out += '"';
   bool checked = false;  // the whole text has been found to be valid UTF-8
   std::size_t run = 0;   // where the characters not yet written begin
-  for (std::size_t i = 0; i < text.size(); ++i) {
+  for (auto i = static_cast<std::size_t>(special - text.begin()); i < text.size(); ++i) {
     const auto c = static_cast<unsigned char>(text[i]);
     if (c >= 0x80) {
       if (checked) continue;
@@ -386,7 +387,7 @@ void appendJsonString(std::string& out, std::string_view text) {
       checked = true;
       continue;
     }
-    if (c >= 0x20 && c != '"' && c != '\\') continue;
+    if (kPlainBytes[c]) continue;
     out.append(text.data() + run, i - run);
     run = i + 1;
     switch (c) {
