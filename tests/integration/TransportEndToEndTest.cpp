@@ -128,8 +128,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
       EXPECT_EQ(command.response() ? command.response()->statusCode : 0, *c.http) << c.name;
     }
     EXPECT_FALSE(command.wasRedirected()) << c.name;
-    EXPECT_EQ(log->contains(std::string("failed: ") + std::string(describeTransferError(c.expected))),
-              c.expected != KYTransferError::None) << c.name;  // the log says why
+    EXPECT_EQ(log->contains("failed: " + std::string(describeTransferError(c.expected))), c.expected != KYTransferError::None) << c.name;
   }
   platform::Log::shared().setSink(previousSink);
 }
