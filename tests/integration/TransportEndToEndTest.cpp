@@ -85,6 +85,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
     KYTransferError expected;
     std::optional<std::int64_t> http = {};
     std::optional<std::string> host = {};  // instead of the simulator's
+    const char* detail = "";                // in curl's own words, which say more than its error code
     bool trustSim = true;
     bool cutShort = false;  // the controller goes while the exchange runs
     std::size_t maxResponseBytes = 1u << 20;
@@ -94,7 +95,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
   const auto packed = bodies.write("packed.json", std::string(4096, ' ') + "{}");
   const std::vector<Case> cases = {
       {.name = "no host", .expected = KYTransferError::NoHost, .host = ""},
-      {.name = "nothing listens", .expected = KYTransferError::Refused, .host = kNothingListens},
+      {.name = "nothing listens", .expected = KYTransferError::Refused, .host = kNothingListens, .detail = "port"},
       // 0 ms would be no limit at all to curl: the slow answer would come after 20 s.
       {.name = "a limit of 0 ms", .simArgs = {"--fault", "slow:20000"}, .expected = KYTransferError::TimedOut,
        .totalTimeout = 0ms},
@@ -123,6 +124,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
     EXPECT_EQ(ended.completions, 1) << c.name;
     EXPECT_FALSE(ended.answeredOnCallerThread) << c.name;
     EXPECT_EQ(command.transferError(), c.expected) << c.name << ": " << command.transferErrorDetail();
+    EXPECT_NE(command.transferErrorDetail().find(c.detail), std::string::npos) << c.name;
     EXPECT_EQ(command.wasSuccessful(), c.expected == KYTransferError::None) << c.name;
     if (c.http) {
       EXPECT_EQ(command.response() ? command.response()->statusCode : 0, *c.http) << c.name;

@@ -98,6 +98,9 @@ TEST(ImageDecoding, DecodesPicturesAndRefusesTheRest) {
   EXPECT_EQ(picture->height, 1);
   EXPECT_EQ(picture->channels, 1);
   EXPECT_EQ(picture->pixels, (std::vector<std::uint8_t>{0x10, 0xF0}));
+  const auto bytes = test::tinyPicture();  // a contact's picture: its size and its bytes, no second copy as pixels
+  const auto held = imageFromData(bytes);
+  EXPECT_TRUE(held && held->width == 2 && held->encoded == bytes && held->pixels.empty());
 
   // Nothing, junk, a header that promises 40000 x 40000 pixels (refused before anything is allocated)
   // and a header that ends before the size.

@@ -35,6 +35,7 @@ TEST(Format, AbsentObjectsPrintNullAndObjectsTheirDescription) {
 TEST(Format, OddFormatsNeitherCrashNorConsumeArguments) {
   EXPECT_EQ(format("%q"), "%q");          // length modifier then the end
   EXPECT_EQ(format("%"), "%");
+  EXPECT_EQ(format(std::string_view("%d").substr(0, 1)), "%");  // nothing is read past the end
   EXPECT_EQ(format("%y %@", "a"), "%y a");  // unknown conversion keeps the argument
   EXPECT_EQ(format("%@ and %@", "one"), "one and ");
   EXPECT_EQ(format("%9$@", "one"), "");

@@ -1,6 +1,7 @@
 #include "platform/prefs/FilePreferencesStore.h"
 #include "support/PlatformTest.h"
 
+#include <fcntl.h>
 #include <sys/wait.h>
 #include <unistd.h>
 
@@ -38,6 +39,16 @@ TEST_F(PreferencesStoreTest, OtherStoresSeeAValueOnceItIsSynchronisedAndRemovalD
   writer.setValue("d", "host", std::nullopt);
   ASSERT_TRUE(writer.synchronize("d"));
   EXPECT_FALSE(FilePreferencesStore(dir()).value("d", "host"));
+}
+
+TEST_F(PreferencesStoreTest, EveryDescriptorIsClosedEvenNumberZero) {  // a host may run with its input closed
+  const int input = ::dup(0);
+  ::close(0);
+  FilePreferencesStore store(dir());
+  store.setValue("d", "k", Value(1));
+  EXPECT_TRUE(store.synchronize("d") && FilePreferencesStore(dir()).value("d", "k") && ::fcntl(0, F_GETFD) == -1);
+  ::dup2(input, 0);
+  ::close(input);
 }
 
 TEST_F(PreferencesStoreTest, ConcurrentWritersInTwoProcessesLoseNoUpdate) {

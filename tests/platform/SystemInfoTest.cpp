@@ -1,4 +1,5 @@
 #include "platform/fs/Files.h"
+#include "platform/resources/Resources.h"
 #include "platform/sysinfo/LinuxSystemInfo.h"
 #include "support/PlatformTest.h"
 
@@ -28,10 +29,8 @@ TEST_F(SystemInfoTest, AFullAccountFileGivesTheAccountAndItsToken) {
   configDir->write("token", "  tok-123\n", 0600);
   auto account = info().ownerAccount();
   ASSERT_TRUE(account);
-  EXPECT_EQ(account->personId(), "P7");
-  EXPECT_EQ(account->username(), "ada@example.test");
-  EXPECT_EQ(account->tokenOfType(0), "tok-123");
-  EXPECT_EQ(account->hostNameOfType(0), "kyn.example.test:8443");
+  EXPECT_EQ(std::tuple(account->personId(), account->username(), account->tokenOfType(0), account->hostNameOfType(0)),
+            std::tuple("P7", "ada@example.test", "tok-123", "kyn.example.test:8443"));
   EXPECT_FALSE(account->tokenOfType(1) || account->hostNameOfType(1));
   EXPECT_FALSE(log->contains("tok-123"));
 }
@@ -97,6 +96,9 @@ TEST_F(SystemInfoTest, AFileStampShowsEachChangeOnceSettled) {
   EXPECT_TRUE(FileStamp::of(file, later).unchangedSince(first));
   configDir->write("f", "three");
   EXPECT_FALSE(FileStamp::of(file, later).unchangedSince(first));
+  fs::last_write_time(file, fs::file_time_type::clock::now() + std::chrono::hours(1));
+  const std::time_t modified = FileStamp::of(file).fields[3];
+  EXPECT_FALSE(FileStamp::of(file, modified + 1).settled);  // one second after its last change is not enough
 }
 
 TEST_F(SystemInfoTest, DeviceFacts) {
@@ -113,8 +115,10 @@ TEST_F(SystemInfoTest, DeviceFacts) {
   EXPECT_EQ(facts.productType(), std::string(256, 'p'));
   configDir->write("product_name", std::string(257, 'p'));  // longer than any product name: not read
   EXPECT_FALSE(facts.productType());
-  configDir->write("os-release", "VERSION_ID=12\n");
-  EXPECT_NE(facts.osBuildVersion().value_or(""), "");  // the kernel's release instead
+  configDir->write("os-release", "BUILD_ID=b\n#" + std::string(64 * 1024 - 12, ' '));
+  EXPECT_EQ(facts.osBuildVersion(), "b");  // 64 KiB is still read, one byte more is not
+  configDir->write("os-release", "BUILD_ID=b\n#" + std::string(64 * 1024 - 11, ' '));
+  EXPECT_NE(facts.osBuildVersion().value_or("b"), "b");  // the kernel's release instead
   // An identifier exactly when the machine has an id (a bare chroot may have none).
   ASSERT_EQ(facts.deviceUDID().has_value(), test::readFile("/etc/machine-id").size() >= 32);
   if (auto udid = facts.deviceUDID()) {
@@ -127,6 +131,10 @@ TEST_F(SystemInfoTest, DeviceFacts) {
     EXPECT_EQ(test::readFile("/etc/machine-id").find(compact), std::string::npos)
         << "the raw machine id must not leave the machine";
   }
+}
+
+TEST(Resources, AreLookedUpBesideTheBinaryThatHoldsTheCode) {
+  EXPECT_EQ(resourceDirectory(), fs::canonical("/proc/self/exe").parent_path() / "resources");
 }
 
 TEST(SignInCheck, EachFieldIsCheckedInTurn) {
@@ -152,6 +160,7 @@ TEST(SignInCheck, EachFieldIsCheckedInTurn) {
                            "x_y", "[::1", "[]", "[::1]:", "[::1]x", "[g::1]", "[::1]:0"}) {
     EXPECT_EQ(checkSignIn({"P", "u", host, "t"}), SignInProblem::ServiceHost) << host;
   }
+  EXPECT_EQ(checkSignIn({"P", "u", std::string(253, 'h'), "t"}), SignInProblem::None);
   EXPECT_EQ(checkSignIn({"P", "u", std::string(254, 'h'), "t"}), SignInProblem::ServiceHost);
 }
 
@@ -173,6 +182,8 @@ TEST_F(SystemInfoTest, SigningInWritesBothFilesWholeAndSigningOutRemovesThem) {
   EXPECT_EQ(readAccountFile(dir / "account.json")->personId, "P-1");
   EXPECT_FALSE(log->contains("tok-"));
 
+  log->clear();  // a folder that cannot be made is reported
+  EXPECT_TRUE(!writeSignIn(dir / "token" / "sub", {"P-2", "u", "h", "t"}) && !log->messages(LogLevel::Error).empty());
   EXPECT_TRUE(removeSignIn(dir));
   EXPECT_FALSE(fs::exists(dir / "account.json") || fs::exists(dir / "token"));
   EXPECT_FALSE(removeSignIn(dir));
