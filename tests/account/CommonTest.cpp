@@ -27,10 +27,8 @@ TEST_F(CommonTest, ALoadedAccountIsReadOnceUntilCleared) {
   systemInfo->signIn("P-9", "tok", "kyn.example.test", "grace@example.test");
   Common common;
   EXPECT_TRUE(common.hasKYNUser());
-  EXPECT_EQ(common.personID(), "P-9");
-  EXPECT_EQ(common.appToken(), "tok");
-  EXPECT_EQ(common.username(), "grace@example.test");
-  EXPECT_EQ(common.kynHost(), "kyn.example.test");
+  EXPECT_EQ(std::tuple(common.personID(), common.appToken(), common.username(), common.kynHost()),
+            std::tuple("P-9", "tok", "grace@example.test", "kyn.example.test"));
   EXPECT_FALSE(common.tokenIsNotAccessible());
   EXPECT_EQ(systemInfo->accountReads, 1);
 

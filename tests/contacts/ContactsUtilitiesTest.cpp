@@ -32,12 +32,10 @@ TEST(OptimalContact, PrefersTheFirstWithAFullPicture) {
 }
 
 TEST_F(ContactsUtilitiesTest, EmptyOrAbsentTextsNeverReachTheStore) {
-  EXPECT_FALSE(ContactsUtilities::contactForEmail(""));
-  EXPECT_FALSE(ContactsUtilities::contactForEmail(std::nullopt));
-  EXPECT_FALSE(ContactsUtilities::contactForPhone(""));
-  EXPECT_FALSE(ContactsUtilities::contactForPhone(std::nullopt));
-  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(std::nullopt));
-  EXPECT_FALSE(ContactsUtilities::contactForAssistantId("https://example.com/not-ours"));
+  EXPECT_FALSE(ContactsUtilities::contactForEmail("") || ContactsUtilities::contactForEmail(std::nullopt));
+  EXPECT_FALSE(ContactsUtilities::contactForPhone("") || ContactsUtilities::contactForPhone(std::nullopt));
+  EXPECT_FALSE(ContactsUtilities::contactForAssistantId(std::nullopt) ||
+               ContactsUtilities::contactForAssistantId("https://example.com/not-ours"));
   EXPECT_EQ(addressBook->queries, 0);
 }
 

@@ -104,9 +104,7 @@ TEST_F(KYNAXLocationTest, WithoutAPersonTheContactsNameTheFriend) {
   const Value entry = Value::object();
   const auto byEmail = KYNAXLocation::locationWithHandle("ADA@example.com", nullptr, &entry);
   const auto& person = *byEmail->avixLocation->friend_->object;
-  EXPECT_EQ(person.firstName, "Ada");
-  EXPECT_EQ(person.lastName, "Lovelace");
-  EXPECT_EQ(person.fullName, "Ada Lovelace");
+  EXPECT_EQ(std::tie(person.firstName, person.lastName, person.fullName), std::tuple("Ada", "Lovelace", "Ada Lovelace"));
   EXPECT_EQ(person.identifier, platform::assistantIdentifierForContactIdentifier("ada-1"));
   EXPECT_EQ(person.emails->at(0)->emailAddress, "ADA@example.com");
   EXPECT_FALSE(person.phones);

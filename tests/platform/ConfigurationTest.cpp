@@ -20,12 +20,10 @@ class ConfigurationTest : public test::PlatformTest {
 
 TEST_F(ConfigurationTest, WithoutAFileEverythingHasItsDefault) {
   const auto c = Configuration::load(configDir->path());
-  EXPECT_EQ(c.accountFile(), configDir->path() / "account.json");
-  EXPECT_EQ(c.tokenFile(), configDir->path() / "token");
-  EXPECT_EQ(c.preferencesDirectory(), configDir->path() / "preferences");
-  EXPECT_EQ(c.contactsPath(), configDir->path() / "contacts");
-  EXPECT_FALSE(c.language());
-  EXPECT_FALSE(c.transport().caFile);
+  const auto& dir = configDir->path();
+  EXPECT_EQ(std::tuple(c.accountFile(), c.tokenFile(), c.preferencesDirectory(), c.contactsPath()),
+            std::tuple(dir / "account.json", dir / "token", dir / "preferences", dir / "contacts"));
+  EXPECT_FALSE(c.language() || c.transport().caFile);
   EXPECT_EQ(errors(), 0u);
 }
 
@@ -53,9 +51,8 @@ TEST_F(ConfigurationTest, AFieldOfTheWrongTypeOrOutOfRangeKeepsItsDefaultAndIsLo
   const TransportSettings defaults;
   const auto c = withFile(R"({"caFile":7,"contacts":["a"],"language":null,"connectTimeoutMs":"250",
                               "totalTimeoutMs":-5,"maxResponseBytes":0,"maxRedirects":51})");
-  EXPECT_FALSE(c.transport().caFile);
+  EXPECT_FALSE(c.transport().caFile || c.language());
   EXPECT_EQ(c.contactsPath(), configDir->path() / "contacts");
-  EXPECT_FALSE(c.language());
   EXPECT_EQ(c.transport().connectTimeout, defaults.connectTimeout);
   EXPECT_EQ(c.transport().totalTimeout, defaults.totalTimeout);
   EXPECT_EQ(c.transport().maxResponseBytes, defaults.maxResponseBytes);

@@ -43,12 +43,7 @@ class AgeStringsTest : public test::PlatformTest {
 };
 
 TEST_F(AgeStringsTest, EveryBandAtItsBoundaries) {
-  struct Case {
-    double secondsAgo;
-    const char* display;
-    const char* spoken;
-  };
-  const Case cases[] = {
+  const std::tuple<double, const char*, const char*> cases[] = {
       {30, "Now", "Located just now"},
       {30.9, "Now", "Located just now"},
       {31, "Over 30 sec ago", "Located more than 30 seconds ago"},
@@ -65,10 +60,10 @@ TEST_F(AgeStringsTest, EveryBandAtItsBoundaries) {
       {86'400.0 * 3, "72 hr ago", "Located 72 hours ago"},
       {-90, "1 min ago", "Located 1 minute ago"},  // the future counts like the past
   };
-  for (const auto& c : cases) {
-    const Band band = ageOf(c.secondsAgo);
-    EXPECT_EQ(band.display, c.display) << c.secondsAgo;
-    EXPECT_EQ(band.spoken, c.spoken) << c.secondsAgo;
+  for (const auto& [secondsAgo, display, spoken] : cases) {
+    const Band band = ageOf(secondsAgo);
+    EXPECT_EQ(band.display, display) << secondsAgo;
+    EXPECT_EQ(band.spoken, spoken) << secondsAgo;
   }
 }
 

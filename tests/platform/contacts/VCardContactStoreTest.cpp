@@ -76,17 +76,12 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
                                                               "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneticFamilyName", "organizationName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
-  EXPECT_EQ(ann->givenName, "Ann");  // the first card's value
-  EXPECT_EQ(ann->familyName, "Other");  // the first card has none
-  EXPECT_EQ(ann->jobTitle, "Pilot");  // only the later card has these
-  EXPECT_EQ(ann->previousFamilyName, "Sample");
-  EXPECT_EQ(ann->note, "n");
-  EXPECT_EQ(ann->nickname, "Annie");
-  EXPECT_EQ(ann->nameSuffix, "III");
-  EXPECT_EQ(ann->phoneticMiddleName, "Ree");
-  EXPECT_EQ(ann->phoneticFamilyName, "Ek");
-  EXPECT_EQ(ann->organizationName, "Air");
-  EXPECT_EQ(ann->departmentName, "Ops");
+  // The first card's given name; the rest only the later card has.
+  EXPECT_EQ((std::vector{ann->givenName, ann->familyName, ann->jobTitle, ann->previousFamilyName, ann->note, ann->nickname,
+                         ann->nameSuffix, ann->phoneticMiddleName, ann->phoneticFamilyName, ann->organizationName,
+                         ann->departmentName}),
+            (std::vector<std::optional<std::string>>{"Ann", "Other", "Pilot", "Sample", "n", "Annie", "III", "Ree", "Ek",
+                                                     "Air", "Ops"}));
   EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
   EXPECT_EQ(ann->emailAddresses.size(), 2u);
   ASSERT_TRUE(ann->imageData);

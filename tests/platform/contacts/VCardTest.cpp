@@ -225,20 +225,13 @@ TEST(VCardProperties, EveryFieldOfAContact) {
       "FN:Second\r\nN:Two;Other;Wrong;Mr.;Jr.\r\nORG:Other;Dept\r\n"));  // the first value of a single-valued field wins
   EXPECT_EQ(c.identifier, "alice-1");
   EXPECT_EQ(c.contactType, ContactType::Person);
-  EXPECT_EQ(c.formattedName, "Dr. Alice Q. Example");
-  EXPECT_EQ(c.familyName, "Example");
-  EXPECT_EQ(c.givenName, "Alice");
-  EXPECT_EQ(c.middleName, "Quinn");
-  EXPECT_FALSE(c.nameSuffix);  // empty components stay absent
-  EXPECT_EQ(c.organizationName, "Acme");
-  EXPECT_EQ(c.nickname, "Al");
-  EXPECT_EQ(c.previousFamilyName, "Sample");
-  EXPECT_EQ(c.phoneticGivenName, "A-lis");
-  EXPECT_EQ(c.phoneticMiddleName, "Kwin");
-  EXPECT_EQ(c.phoneticFamilyName, "Ex-am-pel");
-  EXPECT_EQ(c.jobTitle, "Surveyor");
-  EXPECT_EQ(c.birthday, "1985-04-12");
-  EXPECT_EQ(c.note, "Met at the lake.");
+  EXPECT_EQ((std::vector{c.formattedName, c.familyName, c.givenName, c.middleName, c.nameSuffix, c.organizationName,
+                         c.nickname, c.previousFamilyName, c.phoneticGivenName, c.phoneticMiddleName,
+                         c.phoneticFamilyName, c.jobTitle, c.birthday, c.note}),
+            (std::vector<std::optional<std::string>>{"Dr. Alice Q. Example", "Example", "Alice", "Quinn",
+                                                     std::nullopt,  // empty components stay absent
+                                                     "Acme", "Al", "Sample", "A-lis", "Kwin", "Ex-am-pel", "Surveyor",
+                                                     "1985-04-12", "Met at the lake."}));
   EXPECT_EQ(c.emailAddresses, (Labeled{{"work", "alice@example.com"}, {std::nullopt, "alice@example.org"}}));
   EXPECT_EQ(c.dates, (Labeled{{"anniversary", "2010-05-01"}, {"anniversary", "2011-05-01"}}));
   EXPECT_EQ(c.relations, (Labeled{{"spouse", "urn:uuid:1234"}, {std::nullopt, "Bob"}, {"spouse", "Carol"}}));
