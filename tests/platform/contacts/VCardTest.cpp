@@ -48,8 +48,7 @@ TEST(VCardLines, BeginAndEndIgnoreCaseAndJunkBetweenCardsIsIgnored) {
       "  BEGIN:VCARD  \r\nFN:Two\r\n\tEND:VCARD\r\ntrailing junk",  // indented, yet no fold
       "mixed.vcf");
   ASSERT_EQ(result.contacts.size(), 2u);
-  EXPECT_EQ(result.contacts[0].formattedName, "One");
-  EXPECT_EQ(result.contacts[1].formattedName, "Two");
+  EXPECT_EQ(std::tie(result.contacts[0].formattedName, result.contacts[1].formattedName), std::tuple("One", "Two"));
   EXPECT_TRUE(result.skipped.empty());
   EXPECT_NE(result.unread.find("line 1"), std::string::npos) << result.unread;  // ignored, yet reported
 }
@@ -58,8 +57,7 @@ TEST(VCardLines, EmptyAndJunkTextsHoldNoCards) {
   for (std::string_view text : {std::string_view(""), std::string_view("\r\n \r\n"), std::string_view("END:VCARD\r\n"),
                                  std::string_view("hello\0world", 11)}) {
     const auto result = parseVCards(text, "x.vcf");
-    EXPECT_TRUE(result.contacts.empty());
-    EXPECT_TRUE(result.skipped.empty());
+    EXPECT_TRUE(result.contacts.empty() && result.skipped.empty());
     EXPECT_EQ(result.unread.empty(), text.find_first_not_of("\r\n ") == std::string_view::npos) << result.unread;
   }
   // A card with nothing in it is still a card; a line in it that is no property is reported.
@@ -121,8 +119,7 @@ TEST(VCardLines, CutOffCardsAreReportedAndTheCardsAroundThemRead) {
       "BEGIN:VCARD\nFN:Last Without End\n",
       "cut.vcf");
   ASSERT_EQ(result.contacts.size(), 2u);
-  EXPECT_EQ(result.contacts[0].formattedName, "First");
-  EXPECT_EQ(result.contacts[1].formattedName, "Third");
+  EXPECT_EQ(std::tie(result.contacts[0].formattedName, result.contacts[1].formattedName), std::tuple("First", "Third"));
   EXPECT_EQ(result.contacts[1].identifier, "cut.vcf#2");  // positions count the skipped card too
   EXPECT_EQ(result.skipped, (std::vector<std::string>{"cut.vcf: the card that begins on line 4 has no END:VCARD",
                                                       "cut.vcf: the card that begins on line 10 has no END:VCARD"}));
@@ -137,6 +134,9 @@ TEST(VCardLines, AnEmbeddedAgentCardIsSkippedUpToItsEnd) {
   const Contact sameLine = parseOne(test::vcard("FN:Boss\r\nAGENT:BEGIN:VCARD\r\nFN:Assistant\r\nEND:VCARD\r\nNOTE:after\r\n"));
   EXPECT_EQ(sameLine.formattedName, "Boss");
   EXPECT_EQ(sameLine.note, "after");
+  // After the embedded card, a BEGIN:VCARD again means the card was cut off.
+  const auto cut = parseVCards("BEGIN:VCARD\r\nAGENT:\r\nBEGIN:VCARD\r\nEND:VCARD\r\n" + test::vcard("FN:Next\r\n"), "a.vcf");
+  EXPECT_TRUE(cut.contacts.size() == 1 && cut.contacts[0].formattedName == "Next" && cut.skipped.size() == 1);
 }
 
 TEST(VCardLines, CardsWithoutUidAreNamedByTheirSourceAndPosition) {
