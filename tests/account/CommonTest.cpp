@@ -14,8 +14,7 @@ class CommonTest : public test::PlatformTest {};
 TEST_F(CommonTest, WithoutAnAccountEveryReadAsksTheStoreAgain) {
   systemInfo->signOut();
   Common common;
-  EXPECT_FALSE(common.hasKYNUser());
-  EXPECT_FALSE(common.personID() || common.appToken() || common.username());
+  EXPECT_FALSE(common.hasKYNUser() || common.personID() || common.appToken() || common.username());
   EXPECT_TRUE(common.tokenIsNotAccessible());
   EXPECT_EQ(systemInfo->accountReads, 5);  // one for each read
   systemInfo->signIn("P-1", std::nullopt);

@@ -94,7 +94,9 @@ TEST_F(KYNAXDataSourceTest, ACompletedReplyCarriesTheResultAndTheContext) {
   EXPECT_EQ(found["kynLocations"].size(), 1u);
   EXPECT_EQ(found["atRequestedLocation"], true);
   EXPECT_EQ(found["searchContext"], "kynServerContext://serverContext?clientId=c&");
+  log->clear();
   const auto shown = exchange<ShowHideLocationCmd>(visibility, {true, 200, R"({"statusCode":500,"serverContext":{"c":"1"}})"});
+  EXPECT_TRUE(log->contains("Result: "));
   EXPECT_EQ(shown.first, Value::parse(R"({"class":"AXKynVisibilitySetCompleted",
                                           "searchContext":"kynServerContext://serverContext?c=1&"})"));
   const auto fence = exchange<SetGeoFenceCmd>(geoFence, {true, 200, R"({"statusCode":200,"serverContext":{"c":"2"},

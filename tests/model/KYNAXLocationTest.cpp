@@ -112,8 +112,7 @@ TEST_F(KYNAXLocationTest, WithoutAPersonTheContactsNameTheFriend) {
 
   const auto byPhone = KYNAXLocation::locationWithHandle("+15035550102", nullptr, &entry);
   const auto& hopper = *byPhone->avixLocation->friend_->object;
-  EXPECT_EQ(hopper.fullName, "Grace Hopper");
-  EXPECT_FALSE(hopper.firstName);  // the card has no name parts
+  EXPECT_EQ(std::tie(hopper.fullName, hopper.firstName), std::tuple("Grace Hopper", std::nullopt));  // no name parts
   EXPECT_EQ(hopper.phones->at(0)->number, "+15035550102");
 
   const auto stranger = KYNAXLocation::locationWithHandle("+15035550199", nullptr, &entry);

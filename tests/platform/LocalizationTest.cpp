@@ -59,6 +59,7 @@ TEST(NumberFormatting, DecimalsAreReadAsTheLocaleWritesThem) {
   EXPECT_EQ(de.parseDecimal("1234,5"), 1234.5);
   EXPECT_EQ(de.parseDecimal("1.234,5"), 1234.5);
   EXPECT_EQ(en.parseDecimal("-12"), -12.0);
+  EXPECT_FALSE(IcuNumberFormatting("ar_EG").parseDecimal("1k5"));  // its separator U+066B is no "k"
   for (const char* bad : {"", "abc", "12abc", "1 2"}) EXPECT_FALSE(en.parseDecimal(bad)) << bad;
 }
 

@@ -58,8 +58,7 @@ TEST(Model, CommandsReadBackFromTheirDictionary) {
   ASSERT_TRUE(command->friend_);
   EXPECT_EQ(command->friend_->phones->at(0)->number, "+1 408 555 0100");
   EXPECT_EQ(command->requestedLocation->label, "Home");
-  EXPECT_EQ(command->oneTimeOnly, true);
-  EXPECT_EQ(command->enable, true);
+  EXPECT_EQ(std::tuple(command->oneTimeOnly, command->enable), std::tuple(true, true));
   EXPECT_FALSE(command->fenceType);
   EXPECT_EQ(command->dictionary(), AXKynGeoFenceSet::fromDictionary(command->dictionary())->dictionary());
 }
@@ -69,11 +68,8 @@ TEST(Model, ValuesOfTheWrongTypeAreLeftAbsent) {
     "currentLocation":"here","proximity":{"near":true},"requestedLocation":{"latitude":"48.85","longitude":1e308}})"));
   ASSERT_TRUE(search->friends);
   ASSERT_EQ(search->friends->size(), 1u);  // non-objects skipped
-  EXPECT_FALSE(search->friends->at(0)->emails);
-  EXPECT_FALSE(search->friends->at(0)->firstName);
-  EXPECT_FALSE(search->currentLocation);
-  EXPECT_FALSE(search->proximity);
-  EXPECT_FALSE(search->requestedLocation->latitude);
+  EXPECT_FALSE(search->friends->at(0)->emails || search->friends->at(0)->firstName);
+  EXPECT_FALSE(search->currentLocation || search->proximity || search->requestedLocation->latitude);
   EXPECT_EQ(search->requestedLocation->longitude, 1e308);
 }
 
