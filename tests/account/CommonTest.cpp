@@ -43,8 +43,7 @@ TEST_F(CommonTest, ALoadedAccountIsReadOnceUntilCleared) {
   // Signed out meanwhile: cleared, nothing of the old account is left to use.
   systemInfo->signOut();
   common.clearKYNAccount();
-  EXPECT_FALSE(common.hasKYNUser());
-  EXPECT_FALSE(common.personID() || common.appToken() || common.username() || common.kynHost());
+  EXPECT_FALSE(common.hasKYNUser() || common.personID() || common.appToken() || common.username() || common.kynHost());
 }
 
 TEST_F(CommonTest, AFailedLoadKeepsThePreviousFacts) {

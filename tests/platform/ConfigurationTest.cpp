@@ -33,17 +33,15 @@ TEST_F(ConfigurationTest, EveryFieldIsReadRelativePathsStartAtTheDirectoryAndTim
   EXPECT_EQ(c.transport().caFile, configDir->path() / "certs/ca.pem");
   EXPECT_EQ(c.contactsPath(), "/srv/book.vcf");
   EXPECT_EQ(c.language(), "de-CH");
-  EXPECT_EQ(c.transport().connectTimeout, milliseconds(250));
-  EXPECT_EQ(c.transport().totalTimeout, milliseconds(1501));
-  EXPECT_EQ(c.transport().maxResponseBytes, 4096u);
-  EXPECT_EQ(c.transport().maxRedirects, 0);
+  const auto& t = c.transport();
+  EXPECT_EQ(std::tuple(t.connectTimeout, t.totalTimeout, t.maxResponseBytes, t.maxRedirects),
+            std::tuple(milliseconds(250), milliseconds(1501), std::size_t{4096}, 0));
   c = withFile(R"({"caFile":"/etc/ca.pem","contacts":"book","maxRedirects":50})");
   EXPECT_EQ(c.transport().caFile, "/etc/ca.pem");
   EXPECT_EQ(c.contactsPath(), configDir->path() / "book");
   EXPECT_EQ(c.transport().maxRedirects, 50);
   c = withFile(R"({"connectTimeoutMs": 0, "totalTimeoutMs": 0.4})");  // curl reads 0 ms as no limit at all
-  EXPECT_EQ(c.transport().connectTimeout, milliseconds(1));
-  EXPECT_EQ(c.transport().totalTimeout, milliseconds(1));
+  EXPECT_EQ(std::tuple(c.transport().connectTimeout, c.transport().totalTimeout), std::tuple(milliseconds(1), milliseconds(1)));
   EXPECT_EQ(errors(), 0u);
 }
 
@@ -53,10 +51,9 @@ TEST_F(ConfigurationTest, AFieldOfTheWrongTypeOrOutOfRangeKeepsItsDefaultAndIsLo
                               "totalTimeoutMs":-5,"maxResponseBytes":0,"maxRedirects":51})");
   EXPECT_FALSE(c.transport().caFile || c.language());
   EXPECT_EQ(c.contactsPath(), configDir->path() / "contacts");
-  EXPECT_EQ(c.transport().connectTimeout, defaults.connectTimeout);
-  EXPECT_EQ(c.transport().totalTimeout, defaults.totalTimeout);
-  EXPECT_EQ(c.transport().maxResponseBytes, defaults.maxResponseBytes);
-  EXPECT_EQ(c.transport().maxRedirects, defaults.maxRedirects);
+  const auto& t = c.transport();
+  EXPECT_EQ(std::tuple(t.connectTimeout, t.totalTimeout, t.maxResponseBytes, t.maxRedirects),
+            std::tuple(defaults.connectTimeout, defaults.totalTimeout, defaults.maxResponseBytes, defaults.maxRedirects));
   EXPECT_EQ(errors(), 7u);
   for (const char* text : {R"({"maxRedirects":-1})", R"({"maxResponseBytes":1e13})", R"({"connectTimeoutMs":1e12})"}) {
     (void)withFile(text);

@@ -72,6 +72,9 @@ TEST_F(SystemInfoTest, OnlyAPrivateRegularTokenFileIsRead) {
   EXPECT_EQ(token(), "tok-123");
   configDir->write("token", " \n", 0600);
   EXPECT_FALSE(token());  // an empty token is none
+  log->clear();
+  configDir->write("token", std::string(4097, 't'), 0600);
+  EXPECT_TRUE(!token() && !log->messages(LogLevel::Error).empty());  // too large: refused, and reported
   ::setenv("KYN_APP_TOKEN", "env-token", 1);
   EXPECT_EQ(token(), "env-token");  // the environment wins
   ::unsetenv("KYN_APP_TOKEN");

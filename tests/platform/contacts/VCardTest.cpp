@@ -175,11 +175,13 @@ TEST(VCardProperties, LabelsFromTypesAndFromGroupLabels) {
       "TEL;TYPE=VOICE,MSG,X400:5\r\nTEL;TYPE=CELL,WORK:6\r\n"
       "item2.X-ABDATE:2001-06-02\r\nitem2.X-ABLabel:_$!<Anniversary>!$_\r\n"
       "item3.X-ABLabel:My Label\r\nitem3.URL:https://example.org\r\n"  // the label may come first
-      "item4.URL;TYPE=HOME:https://example.net\r\n"));                 // a group without label
+      "item4.URL;TYPE=HOME:https://example.net\r\n"                   // a group without label
+      "item5.X-ABLabel:_$!<Half\r\nitem5.URL:https://example.com\r\n"));  // half a standard label stays
   EXPECT_EQ(c.phoneNumbers, (Labeled{{"home fax", "1"}, {"fax", "2"}, {"main", "3"}, {"other", "4"}, {std::nullopt, "5"},
                                      {"mobile", "6"}}));
   EXPECT_EQ(c.dates, (Labeled{{"Anniversary", "2001-06-02"}}));
-  EXPECT_EQ(c.urlAddresses, (Labeled{{"My Label", "https://example.org"}, {"home", "https://example.net"}}));
+  EXPECT_EQ(c.urlAddresses, (Labeled{{"My Label", "https://example.org"}, {"home", "https://example.net"},
+                                     {"_$!<Half", "https://example.com"}}));
 }
 
 TEST(VCardProperties, EscapesAndStructuredValues) {
@@ -275,6 +277,7 @@ TEST(VCardEncodings, QuotedPrintableWithSoftBreaksAndFolds) {
       "TITLE;ENCODING=QUOTED-PRINTABLE:Ends with soft break= \r\n"
       "\r\n"
       "ORG;ENCODING=QUOTED-PRINTABLE:Bad =ZZ escape=4\r\n"
+      "X-MAIDENNAME;ENCODING=QUOTED-PRINTABLE:a=0Db\r\n"  // a lone CR is a line break too
       "NICKNAME;ENCODING=QUOTED-PRINTABLE:dangling=\r\n",  // a soft break never swallows the card's end
       "2.1"));
   EXPECT_EQ(c.note, "Line one\nLine two = done\nthird");
@@ -284,6 +287,7 @@ TEST(VCardEncodings, QuotedPrintableWithSoftBreaksAndFolds) {
   EXPECT_EQ(c.jobTitle, "Ends with soft break");
   EXPECT_EQ(c.organizationName, "Bad =ZZ escape=4");  // broken escapes stay as written
   EXPECT_EQ(c.nickname, "dangling");
+  EXPECT_EQ(c.previousFamilyName, "a\nb");
 }
 
 TEST(VCardEncodings, CharsetsAndBytesThatAreNoUtf8) {
