@@ -66,6 +66,12 @@ std::optional<std::string> Common::appToken() {
   return appToken_;
 }
 
+Common::Credentials Common::credentials() {
+  std::lock_guard lock(mutex_);
+  ensureLoadedLocked();
+  return {personID_, appToken_, kynHost_};
+}
+
 bool Common::tokenIsNotAccessible() {
   std::lock_guard lock(mutex_);
   ensureLoadedLocked();

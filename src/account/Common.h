@@ -45,6 +45,14 @@ class Common {
   /// The application token. A secret: never logged.
   [[nodiscard]] std::optional<std::string> appToken();
   [[nodiscard]] bool tokenIsNotAccessible();
+  /// What every request is made with, read together: the person identifier, the token (a secret:
+  /// never logged) and the account's service host.
+  struct Credentials {
+    std::optional<std::string> personID;
+    std::optional<std::string> appToken;
+    std::optional<std::string> kynHost;
+  };
+  [[nodiscard]] Credentials credentials();
   [[nodiscard]] bool hasKYNUser();
   /// Forgets every account fact; the next read loads them afresh.
   void clearKYNAccount();

@@ -10,11 +10,12 @@ namespace kyn {
 
 KYNBaseCmd::KYNBaseCmd() {
   Common& common = Common::sharedInstance();
+  auto [personID, appToken, kynHost] = common.credentials();
   setScheme("https");
-  setUsername(common.personID());
-  setPassword(common.appToken());
+  setUsername(std::move(personID));
+  setPassword(std::move(appToken));
   setHost(common.redirectedHost());
-  if (!host()) setHost(common.kynHost());
+  if (!host()) setHost(std::move(kynHost));
 }
 
 Value KYNBaseCmd::headers() const {

@@ -114,10 +114,10 @@ std::string KYNAXUtils::contextIdentifierURLForMembers(std::span<const platform:
   std::string url(kContextURLPrefix);
   for (const auto& [key, value] : members) {
     if (key == "authToken") continue;  // the token never goes into the URL
-    url += platform::encodeToPercentEscape(key);
+    platform::appendPercentEscaped(url, key);
     url += '=';
-    const auto text = value.string();
-    url += platform::encodeToPercentEscape(text ? *text : describe(value));
+    if (const auto text = value.string()) platform::appendPercentEscaped(url, *text);
+    else platform::appendPercentEscaped(url, describe(value));
     url += '&';
   }
   return url;

@@ -90,6 +90,16 @@ TEST_F(SystemInfoTest, OnlyAPrivateRegularTokenFileIsRead) {
   EXPECT_FALSE(log->contains("tok-123") || log->contains("tok-456"));
 }
 
+TEST_F(SystemInfoTest, ATokenReadOnceIsReadAgainWhenItsFileChanges) {
+  const auto file = configDir->write("token", "tok-1", 0600);
+  const std::time_t later = std::time(nullptr) + 10;  // as if the file had not changed for a while
+  EXPECT_EQ(readApplicationToken(file, later), "tok-1");
+  configDir->write("token", "tok-2", 0600);
+  EXPECT_EQ(readApplicationToken(file, later), "tok-2");
+  fs::permissions(file, fs::perms::group_read, fs::perm_options::add);
+  EXPECT_FALSE(readApplicationToken(file, later));
+}
+
 TEST_F(SystemInfoTest, AFileStampShowsEachChangeOnceSettled) {
   const auto file = configDir->write("f", "one");
   fs::last_write_time(file, fs::file_time_type::clock::now() - std::chrono::hours(1));  // changes its ctime
@@ -100,7 +110,7 @@ TEST_F(SystemInfoTest, AFileStampShowsEachChangeOnceSettled) {
   configDir->write("f", "three");
   EXPECT_FALSE(FileStamp::of(file, later).unchangedSince(first));
   fs::last_write_time(file, fs::file_time_type::clock::now() + std::chrono::hours(1));
-  const std::time_t modified = FileStamp::of(file).fields[3];
+  const std::time_t modified = FileStamp::of(file).modified();
   EXPECT_FALSE(FileStamp::of(file, modified + 1).settled);  // one second after its last change is not enough
 }
 

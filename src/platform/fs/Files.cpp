@@ -30,15 +30,30 @@ std::optional<std::string> readWholeFile(const std::filesystem::path& file, std:
   return text;
 }
 
-FileStamp FileStamp::of(const std::filesystem::path& file, std::time_t now) noexcept {
-  struct stat st {};
+namespace {
+
+FileStamp stampOf(int result, const struct stat& st, std::time_t now) noexcept {
   FileStamp stamp;
-  if (::stat(file.c_str(), &st) != 0) return stamp;
+  if (result != 0) return stamp;
   stamp.exists = true;
   stamp.fields = {static_cast<std::int64_t>(st.st_dev), static_cast<std::int64_t>(st.st_ino), st.st_size,
                   st.st_mtim.tv_sec, st.st_mtim.tv_nsec, st.st_ctim.tv_sec, st.st_ctim.tv_nsec};
   stamp.settled = now - st.st_mtim.tv_sec > 1 && now - st.st_ctim.tv_sec > 1;
   return stamp;
+}
+
+}  // namespace
+
+FileStamp FileStamp::of(const std::filesystem::path& file, std::time_t now) noexcept {
+  struct stat st {};
+  const int result = ::stat(file.c_str(), &st);
+  return stampOf(result, st, now);
+}
+
+FileStamp FileStamp::ofLink(const std::filesystem::path& file, std::time_t now) noexcept {
+  struct stat st {};
+  const int result = ::lstat(file.c_str(), &st);
+  return stampOf(result, st, now);
 }
 
 }  // namespace kyn::platform

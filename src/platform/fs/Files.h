@@ -27,6 +27,10 @@ struct FileStamp {
 
   /// The file's stamp, taken at `now`.
   [[nodiscard]] static FileStamp of(const std::filesystem::path& file, std::time_t now = std::time(nullptr)) noexcept;
+  /// The stamp of `file` itself when it is a symbolic link, not of what it points to.
+  [[nodiscard]] static FileStamp ofLink(const std::filesystem::path& file, std::time_t now = std::time(nullptr)) noexcept;
+  /// When the content last changed, in seconds since 1970.
+  [[nodiscard]] std::int64_t modified() const noexcept { return fields[3]; }
   /// Whether what was read under `earlier` is still the file's content.
   [[nodiscard]] bool unchangedSince(const FileStamp& earlier) const noexcept {
     return earlier.settled && exists == earlier.exists && fields == earlier.fields;

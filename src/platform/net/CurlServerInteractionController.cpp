@@ -372,7 +372,6 @@ class Engine : public std::enable_shared_from_this<Engine> {
     CURL* easy = transfer.easy();
     const Request& r = transfer.request;
     if (!transfer.setHeaders()) return false;
-    curl_easy_setopt(easy, CURLOPT_PRIVATE, &transfer);
     curl_easy_setopt(easy, CURLOPT_URL, r.url.c_str());
     curl_easy_setopt(easy, CURLOPT_PROTOCOLS_STR, "https");
     curl_easy_setopt(easy, CURLOPT_NOSIGNAL, 1L);

@@ -100,10 +100,29 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   return account;
 }
 
-std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile) {
+std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile, std::time_t now) {
   if (const char* env = std::getenv("KYN_APP_TOKEN"); env != nullptr && *env != '\0') {
     std::string token = trim(env);
     if (!token.empty()) return token;
+  }
+  // The token last read, with the stamp of its file (of a link itself, which is refused) and the
+  // user it was read as: a change of content, mode or owner changes the stamp.
+  struct Read {
+    std::filesystem::path path;
+    FileStamp stamp;
+    uid_t user;
+    std::string token;
+  };
+  static std::mutex mutex;
+  static std::optional<Read> last;
+  const FileStamp stamp = FileStamp::ofLink(tokenFile, now);
+  const uid_t user = ::geteuid();
+  {
+    std::lock_guard lock(mutex);
+    if (stamp.exists && last && last->path == tokenFile && last->user == user && stamp.unchangedSince(last->stamp)) {
+      return last->token;
+    }
+    last.reset();
   }
   const int fd = ::open(tokenFile.c_str(), O_RDONLY | O_CLOEXEC | O_NOFOLLOW | O_NONBLOCK);
   if (fd < 0) {
@@ -114,7 +133,7 @@ std::optional<std::string> readApplicationToken(const std::filesystem::path& tok
   std::optional<std::string> token;
   if (::fstat(fd, &st) != 0 || !S_ISREG(st.st_mode)) {
     Log::shared().error("Token file %@ is not a regular file; it is not used", tokenFile.string());
-  } else if (st.st_uid != ::geteuid() || (st.st_mode & (S_IRWXG | S_IRWXO)) != 0) {
+  } else if (st.st_uid != user || (st.st_mode & (S_IRWXG | S_IRWXO)) != 0) {
     char mode[8];
     std::snprintf(mode, sizeof mode, "%04o", static_cast<unsigned>(st.st_mode & 07777));
     Log::shared().error("Token file %@ may be read by others (mode %@) or belongs to another user; it is not used",
@@ -136,6 +155,10 @@ std::optional<std::string> readApplicationToken(const std::filesystem::path& tok
     if (!trimmed.empty()) token = std::move(trimmed);
   }
   ::close(fd);
+  if (token) {
+    std::lock_guard lock(mutex);
+    last = Read{tokenFile, stamp, user, *token};
+  }
   return token;
 }
 

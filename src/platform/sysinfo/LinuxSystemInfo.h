@@ -5,6 +5,7 @@
 
 #include "platform/sysinfo/SystemInfo.h"
 
+#include <ctime>
 #include <filesystem>
 #include <optional>
 #include <string>
@@ -30,8 +31,10 @@ struct AccountFile {
 /// Reads the application token: the environment variable KYN_APP_TOKEN when it is set and not empty,
 /// otherwise the token file. The file must be a regular file owned by this user that no one else may
 /// read or write; any other file is refused with a log line. Surrounding blanks are trimmed; an empty
-/// token is none. The token itself is never logged.
-[[nodiscard]] std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile);
+/// token is none. The token itself is never logged. Every command reads it: a file whose stamp,
+/// taken at `now`, is unchanged since it was last read is not opened again.
+[[nodiscard]] std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile,
+                                                              std::time_t now = std::time(nullptr));
 
 /// What signing in stores: the account and its application token.
 struct SignIn {

@@ -53,20 +53,30 @@ Int leadingInteger(std::string_view text) noexcept {
 
 }  // namespace
 
-std::string encodeToPercentEscape(std::string_view text) {
+void appendPercentEscaped(std::string& out, std::string_view text) {
   static constexpr char kHex[] = "0123456789ABCDEF";
+  static constexpr auto kUnreserved = [] {
+    std::array<bool, 256> table{};
+    for (int c = 0; c < 256; ++c) table[static_cast<std::size_t>(c)] = isUnreserved(static_cast<unsigned char>(c));
+    return table;
+  }();
+  std::size_t i = 0;
+  while (i < text.size()) {
+    std::size_t run = i;
+    while (run < text.size() && kUnreserved[static_cast<unsigned char>(text[run])]) ++run;
+    out.append(text.data() + i, run - i);
+    if (run == text.size()) break;
+    const auto c = static_cast<unsigned char>(text[run]);
+    const char escaped[3] = {'%', kHex[c >> 4], kHex[c & 0x0F]};
+    out.append(escaped, 3);
+    i = run + 1;
+  }
+}
+
+std::string encodeToPercentEscape(std::string_view text) {
   std::string out;
   out.reserve(text.size());
-  for (char ch : text) {
-    const auto c = static_cast<unsigned char>(ch);
-    if (isUnreserved(c)) {
-      out.push_back(ch);
-    } else {
-      out.push_back('%');
-      out.push_back(kHex[c >> 4]);
-      out.push_back(kHex[c & 0x0F]);
-    }
-  }
+  appendPercentEscaped(out, text);
   return out;
 }
 

@@ -13,6 +13,8 @@ namespace kyn::platform {
 /// Percent-escapes every byte except the unreserved characters A-Z a-z 0-9 - . _ ~, so that the result
 /// can stand as a key or a value in a URL query ("&", "=", "%", "+", blanks and non-ASCII included).
 [[nodiscard]] std::string encodeToPercentEscape(std::string_view text);
+/// `encodeToPercentEscape(text)` appended to `out`.
+void appendPercentEscaped(std::string& out, std::string_view text);
 
 /// The exact inverse of `encodeToPercentEscape`: decodes every %XX. Nothing for a broken escape
 /// ("%", "%4", "%zz") or when the decoded bytes are not valid UTF-8.

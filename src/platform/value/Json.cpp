@@ -365,13 +365,14 @@ void appendJsonString(std::string& out, std::string_view text) {
   // Most texts are plain ASCII: they are copied between their quotes in one step. Of the others,
   // the plain start is not looked at again.
   const auto special = std::find_if(text.begin(), text.end(), [](char c) { return !kPlainBytes[static_cast<unsigned char>(c)]; });
-  const std::size_t start = out.size();
-  out += '"';
   if (special == text.end()) {
+    out += '"';
     out.append(text);
     out += '"';
     return;
   }
+  const std::size_t start = out.size();
+  out += '"';
   bool checked = false;  // the whole text has been found to be valid UTF-8
   std::size_t run = 0;   // where the characters not yet written begin
   for (auto i = static_cast<std::size_t>(special - text.begin()); i < text.size(); ++i) {
