@@ -3,6 +3,10 @@
 
 #include <gtest/gtest.h>
 
+#include <bit>
+#include <cmath>
+#include <random>
+
 namespace kyn::platform {
 namespace {
 
@@ -69,6 +73,25 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   EXPECT_EQ(written("a\x01" "b\x1F"), R"("a\u0001b\u001f")");  // 0x1F: the last control character
   EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
   EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
+}
+
+TEST(Json, ANumberIsWrittenAsTheLibraryWritesItOrShorterForTheSameDouble) {
+  std::mt19937_64 random(7);
+  std::vector<double> values{0.0001, 0.00012, -0.5, 30.0, 16777215.99999999, 16777216.5, 2147483647.25, 2147483648.5};
+  for (int i = 0; i < 200000; ++i) {  // short decimals of every size, and any double at all
+    const double decimal = static_cast<double>(random() % 100000000) / std::pow(10.0, static_cast<int>(random() % 12));
+    const std::uint64_t bits = random();
+    values.push_back(i % 3 == 0 ? std::bit_cast<double>(bits) : i % 2 ? -decimal : decimal);
+  }
+  for (const double value : values) {
+    if (!std::isfinite(value)) continue;
+    std::string out;
+    appendJsonNumber(out, value);
+    const std::string library = toJson(Value(value));
+    if (out == library) continue;
+    const auto read = parseJson(out);
+    ASSERT_TRUE(out.size() < library.size() && read && read->get<double>() == value) << out << " for " << library;
+  }
 }
 
 TEST(Json, ValueReadersReadATreeAndADocumentAlike) {

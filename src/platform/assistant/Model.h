@@ -58,7 +58,7 @@ class AXObject : public platform::Object {
   [[nodiscard]] virtual std::string_view className() const = 0;
   [[nodiscard]] virtual Value dictionary() const = 0;
   /// Appends the dictionary as JSON text, written from the fields without making the dictionary:
-  /// the same text as `toJson(dictionary())`.
+  /// the same JSON as `toJson(dictionary())`, numbers sometimes in fewer digits.
   virtual void appendJson(std::string& out) const = 0;
   /// "<ClassName {dictionary}>"
   [[nodiscard]] std::string description() const override;

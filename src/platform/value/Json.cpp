@@ -410,14 +410,59 @@ void appendJsonString(std::string& out, std::string_view text) {
   out += '"';
 }
 
+namespace {
+
+/// Writes `value` when it is a short decimal, as coordinates, distances and times in seconds are:
+/// at most 8 decimals below 2^24, at most 6 below 2^31, and not below 1e-4. Its digits times a power
+/// of ten then give it back exactly, and no other decimal of as many places gives the same double
+/// (their spacing is over twice the double's), so they are its shortest form, written as the library
+/// writes numbers of that size ("12.5", "30.0"). Nothing for any other value.
+char* writeShortDecimal(char* out, double value) noexcept {
+  const double magnitude = std::fabs(value);
+  int places;
+  double scale;
+  if (magnitude >= 1e-4 && magnitude < 16777216.0) {
+    places = 8;
+    scale = 1e8;
+  } else if (magnitude >= 16777216.0 && magnitude < 2147483648.0) {
+    places = 6;
+    scale = 1e6;
+  } else {
+    return nullptr;
+  }
+  const double scaled = std::round(magnitude * scale);
+  if (scaled / scale != magnitude) return nullptr;
+  char digits[24];
+  char* end = std::to_chars(digits, digits + sizeof digits, static_cast<std::uint64_t>(scaled)).ptr;
+  while (places > 0 && end[-1] == '0') {
+    --end;
+    --places;
+  }
+  const int whole = static_cast<int>(end - digits) - places;  // digits before the point
+  char* p = out;
+  if (value < 0) *p++ = '-';
+  if (whole <= 0) {
+    *p++ = '0';
+    *p++ = '.';
+    p = std::fill_n(p, -whole, '0');
+    return std::copy(digits, end, p);
+  }
+  p = std::copy(digits, digits + whole, p);
+  *p++ = '.';
+  return places == 0 ? (*p++ = '0', p) : std::copy(digits + whole, end, p);
+}
+
+}  // namespace
+
 void appendJsonNumber(std::string& out, double value) {
   if (!std::isfinite(value)) {
     out += "null";
     return;
   }
-  // The library's own shortest form, so that the text is the one `toJson` writes.
   char buffer[64];
-  const char* end = nlohmann::detail::to_chars(buffer, buffer + sizeof buffer, value);
+  const char* end = writeShortDecimal(buffer, value);
+  // Otherwise the library's own shortest form, the one `toJson` writes.
+  if (end == nullptr) end = nlohmann::detail::to_chars(buffer, buffer + sizeof buffer, value);
   out.append(buffer, static_cast<std::size_t>(end - buffer));
 }
 

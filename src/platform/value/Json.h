@@ -59,8 +59,9 @@ class JsonDocument {
 /// building did. Recursion is as deep as the value (parsed values are bounded by JsonLimits).
 void releaseValue(Value& value) noexcept;
 
-// Pieces of JSON text for writers that do without a Value: each appends exactly what `toJson`
-// writes for the same string or number.
+// Pieces of JSON text for writers that do without a Value: each appends what `toJson` writes for
+// the same string or number, except that a number is sometimes written in fewer digits than the
+// library's (which are not always the fewest), for the same double.
 
 /// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
 void appendJsonString(std::string& out, std::string_view text);
