@@ -17,6 +17,7 @@
 #include "handlers/KYNAXSetGeoFence.h"
 #include "handlers/KYNAXVisibility.h"
 #include "platform/Services.h"
+#include "platform/log/Log.h"
 #include "platform/value/Json.h"
 
 #include <benchmark/benchmark.h>
@@ -318,6 +319,32 @@ void BM_PluginCostWithoutNetwork(benchmark::State& state) {
 }
 BENCHMARK(BM_PluginCostWithoutNetwork)->DenseRange(0, kKinds - 1)->Unit(benchmark::kMicrosecond);
 
+/// Takes log lines and drops them.
+class DroppingSink final : public platform::LogSink {
+ public:
+  void write(const platform::LogRecord& record) noexcept override { benchmark::DoNotOptimize(record.message.data()); }
+};
+
+/// The same with the log at the level a user has by default, which writes the progress lines and
+/// the server's payloads: here they are made and then dropped, as what writing them costs depends
+/// on the system's log.
+void BM_PluginCostWithTheDefaultLog(benchmark::State& state) {
+  World& world = World::get();
+  const auto kind = static_cast<Kind>(state.range(0));
+  world.controller->answer = world.answers[kind];
+  auto& log = platform::services().log();
+  const auto sink = log.setSink(std::make_shared<DroppingSink>());
+  log.setMinimumLevel(platform::LogLevel::Info);
+  for (auto _ : state) {
+    const std::string reply = performHere(world.commands[kind]);
+    if (reply.find(kReplyClass[kind]) == std::string::npos) state.SkipWithError("the command failed");
+  }
+  log.setMinimumLevel(platform::LogLevel::Off);
+  log.setSink(sink);
+  state.SetLabel(kKindNames[kind]);
+}
+BENCHMARK(BM_PluginCostWithTheDefaultLog)->DenseRange(0, kKinds - 1)->Unit(benchmark::kMicrosecond);
+
 /// A get-locations answer of `entries` friends, in kyn-sim's words.
 std::string answerWith(int entries) {
   Json locations = Json::object();
@@ -430,6 +457,12 @@ class SummaryReporter final : public benchmark::ConsoleReporter {
       if (own) {
         row(std::string("plug-in's own cost per ") + kKindNames[kind] + (kind == Search ? " (50 friends)" : ""),
             fixed(*own * 1e6, 1) + " us", "<= 30 us", *own * 1e6 <= 30);
+      }
+    }
+    for (int kind = 0; kind < kKinds; ++kind) {
+      if (const auto logged = find("BM_PluginCostWithTheDefaultLog/" + std::to_string(kind))) {
+        row(std::string("  the same with the default log (lines made, not written), ") + kKindNames[kind],
+            fixed(*logged * 1e6, 1) + " us", "", std::nullopt);
       }
     }
     const auto small = find("BM_DecodeFriendEntries/100");

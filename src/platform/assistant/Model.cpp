@@ -28,9 +28,17 @@ std::optional<std::string_view> errorCodeName(std::int64_t code) noexcept {
 }
 
 std::string AXObject::description() const {
-  std::string text = "<" + std::string(className()) + " ";
-  appendJson(text);
-  return text + ">";
+  std::string text;
+  appendDescription(text);
+  return text;
+}
+
+void AXObject::appendDescription(std::string& out) const {
+  out += '<';
+  out += className();
+  out += ' ';
+  appendJson(out);
+  out += '>';
 }
 
 std::string AXReply::json() const {

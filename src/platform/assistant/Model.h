@@ -62,6 +62,7 @@ class AXObject : public platform::Object {
   virtual void appendJson(std::string& out) const = 0;
   /// "<ClassName {dictionary}>"
   [[nodiscard]] std::string description() const override;
+  void appendDescription(std::string& out) const override;
 };
 
 namespace detail {

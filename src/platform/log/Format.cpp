@@ -15,6 +15,16 @@ FormatArg::FormatArg(const Value* value) : FormatArg(JsonView(value)) {}
 FormatArg::FormatArg(JsonView value)
     : v_(!value ? std::string("(null)") : value.isString() ? std::string(*value.string()) : toJson(value)) {}
 
+void FormatArg::appendText(std::string& out) const {
+  if (const auto* s = std::get_if<std::string>(&v_)) out += *s;
+  else out += text();
+}
+
+std::size_t FormatArg::sizeHint() const noexcept {
+  const auto* s = std::get_if<std::string>(&v_);
+  return s ? s->size() : 24;
+}
+
 std::string FormatArg::text() const {
   if (const auto* s = std::get_if<std::string>(&v_)) return *s;
   if (const auto* i = std::get_if<std::int64_t>(&v_)) return std::to_string(*i);
@@ -38,7 +48,9 @@ double FormatArg::floating() const {
 
 std::string formatArgs(std::string_view format, std::span<const FormatArg> args) {
   std::string out;
-  out.reserve(format.size() + 16 * args.size());
+  std::size_t room = format.size();
+  for (const FormatArg& arg : args) room += arg.sizeHint();
+  out.reserve(room);
   std::size_t nextArg = 0;
   std::size_t i = 0;
   while (i < format.size()) {
@@ -79,7 +91,7 @@ std::string formatArgs(std::string_view format, std::span<const FormatArg> args)
     switch (conversion) {
       case '@':
       case 's':
-        if (arg) out += arg->text();
+        if (arg) arg->appendText(out);
         break;
       case 'd':
       case 'i':

@@ -50,6 +50,10 @@ class FormatArg {
 
   /// The text for `%@` and `%s`.
   [[nodiscard]] std::string text() const;
+  /// The same text, appended to `out`.
+  void appendText(std::string& out) const;
+  /// About how long the text is, to make room for it.
+  [[nodiscard]] std::size_t sizeHint() const noexcept;
   /// The value for `%d`, `%ld`, `%li`, `%u`: an integer, a double truncated, a text by its leading integer.
   [[nodiscard]] std::int64_t integer() const;
   /// The value for `%f`.
@@ -63,7 +67,8 @@ class FormatArg {
     std::string out = "(";
     for (std::size_t i = 0; i < objects.size(); ++i) {
       if (i) out += ", ";
-      out += objects[i] ? objects[i]->description() : std::string("(null)");
+      if (objects[i]) objects[i]->appendDescription(out);
+      else out += "(null)";
     }
     out += ")";
     return out;
