@@ -127,34 +127,50 @@ struct FieldJsonWriter {
     text[k.size() + 3] = ':';
     out.append(text, k.size() + 4);
   }
-  void operator()(std::string_view k, const std::optional<std::string>& v) const {
+  /// The same for a key written as a literal, as the records' field lists write them: its length
+  /// is known when compiling, so the copy needs no call.
+  template <std::size_t N>
+  void key(const char (&k)[N]) const {
+    char text[N + 3];
+    text[0] = ',';
+    text[1] = '"';
+    std::memcpy(text + 2, k, N - 1);
+    text[N + 1] = '"';
+    text[N + 2] = ':';
+    out.append(text, N + 3);
+  }
+  template <class Key>
+  void operator()(const Key& k, const std::optional<std::string>& v) const {
     if (!v) return;
     key(k);
     platform::appendJsonString(out, *v);
   }
-  void operator()(std::string_view k, const std::optional<double>& v) const {
+  template <class Key>
+  void operator()(const Key& k, const std::optional<double>& v) const {
     if (!v || !std::isfinite(*v)) return;
     key(k);
     platform::appendJsonNumber(out, *v);
   }
-  void operator()(std::string_view k, const std::optional<bool>& v) const {
+  template <class Key>
+  void operator()(const Key& k, const std::optional<bool>& v) const {
     if (!v) return;
     key(k);
     out += *v ? "true" : "false";
   }
-  void operator()(std::string_view k, const std::optional<std::int64_t>& v) const {
+  template <class Key>
+  void operator()(const Key& k, const std::optional<std::int64_t>& v) const {
     if (!v) return;
     key(k);
     platform::appendJsonNumber(out, *v);
   }
-  template <class T>
-  void operator()(std::string_view k, const std::shared_ptr<T>& v) const {
+  template <class Key, class T>
+  void operator()(const Key& k, const std::shared_ptr<T>& v) const {
     if (!v) return;
     key(k);
     v->appendJson(out);
   }
-  template <class T>
-  void operator()(std::string_view k, const AXArray<T>& v) const {
+  template <class Key, class T>
+  void operator()(const Key& k, const AXArray<T>& v) const {
     if (!v) return;
     key(k);
     out += '[';

@@ -366,6 +366,15 @@ void appendJsonString(std::string& out, std::string_view text) {
   // the plain start is not looked at again.
   const auto special = std::find_if(text.begin(), text.end(), [](char c) { return !kPlainBytes[static_cast<unsigned char>(c)]; });
   if (special == text.end()) {
+    constexpr std::size_t kShort = 62;  // most texts: written, quotes and all, in one append
+    if (text.size() <= kShort) {
+      char quoted[kShort + 2];
+      quoted[0] = '"';
+      std::memcpy(quoted + 1, text.data(), text.size());
+      quoted[text.size() + 1] = '"';
+      out.append(quoted, text.size() + 2);
+      return;
+    }
     out += '"';
     out.append(text);
     out += '"';
