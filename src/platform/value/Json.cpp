@@ -660,8 +660,23 @@ bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
 
 namespace {
 /// `a == b` without the library's three-way comparison, which the member walks notice.
+/// Member names are short: compared eight bytes at a time in place, without a call.
 inline bool sameText(std::string_view a, std::string_view b) noexcept {
-  return a.size() == b.size() && std::memcmp(a.data(), b.data(), a.size()) == 0;
+  if (a.size() != b.size()) return false;
+  const char* p = a.data();
+  const char* q = b.data();
+  std::size_t n = a.size();
+  for (; n >= 8; n -= 8, p += 8, q += 8) {
+    std::uint64_t x;
+    std::uint64_t y;
+    std::memcpy(&x, p, 8);
+    std::memcpy(&y, q, 8);
+    if (x != y) return false;
+  }
+  for (; n > 0; --n, ++p, ++q) {
+    if (*p != *q) return false;
+  }
+  return true;
 }
 
 /// Calls `visit(name, index of the value)` for each member of the object at `index`, in order.
