@@ -746,15 +746,20 @@ JsonView::Iterator JsonView::begin() const noexcept {
   Iterator it;
   it.container_ = ptr_;
   it.document_ = kind_ == Kind::Document;
-  it.object_ = isObject();
-  if (it.document_ && (it.object_ || isArray())) it.at_ = index_ + 1;
+  const char type = typeOf(*this);
+  it.object_ = type == '{';
+  if (it.document_ && (type == '{' || type == '[')) it.at_ = index_ + 1;
   return it;
 }
 
 JsonView::Iterator JsonView::end() const noexcept {
-  Iterator it = begin();
+  Iterator it;
+  it.container_ = ptr_;
+  it.document_ = kind_ == Kind::Document;
+  const char type = typeOf(*this);
+  it.object_ = type == '{';
   if (kind_ == Kind::Tree && tree().is_structured()) it.at_ = tree().size();
-  if (kind_ == Kind::Document && (it.object_ || isArray())) it.at_ = closing(documentOf(ptr_), index_);
+  if (it.document_ && (type == '{' || type == '[')) it.at_ = closing(documentOf(ptr_), index_);
   return it;
 }
 
