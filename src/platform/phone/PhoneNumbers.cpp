@@ -4,6 +4,7 @@
 #include <phonenumbers/phonenumberutil.h>
 
 #include <cctype>
+#include <cstring>
 #include <list>
 #include <mutex>
 #include <unordered_map>
@@ -21,7 +22,7 @@ std::optional<std::string> readAndWrite(std::string_view text, std::string_view 
 /// on every number, as the least recent one is always the next one read.
 class ResultCache {
  public:
-  std::optional<std::optional<std::string>> find(const std::string& key) {
+  std::optional<std::optional<std::string>> find(std::string_view key) {
     std::lock_guard lock(mutex_);
     const auto it = index_.find(key);
     if (it == index_.end()) return std::nullopt;
@@ -53,12 +54,23 @@ std::optional<std::string> formatPhoneNumber(std::string_view text, std::string_
   // The parser's own limit is 250 characters; longer texts are no phone number anyway.
   if (text.empty() || text.size() > 250) return std::nullopt;
   static ResultCache cache;
-  std::string key;
-  key.reserve(text.size() + region.size() + 3);
-  key.append(1, static_cast<char>('0' + static_cast<int>(style))).append(region).append(1, '\0').append(text);
-  if (auto cached = cache.find(key)) return *cached;
+  // The key is made on the stack: most look-ups find it, and need no copy of it.
+  char stackKey[300];
+  const std::size_t keySize = text.size() + region.size() + 2;
+  std::string heapKey;
+  char* key = stackKey;
+  if (keySize > sizeof stackKey) {
+    heapKey.resize(keySize);
+    key = heapKey.data();
+  }
+  key[0] = static_cast<char>('0' + static_cast<int>(style));
+  std::memcpy(key + 1, region.data(), region.size());
+  key[region.size() + 1] = '\0';
+  std::memcpy(key + region.size() + 2, text.data(), text.size());
+  const std::string_view keyView(key, keySize);
+  if (auto cached = cache.find(keyView)) return *cached;
   auto result = readAndWrite(text, region, style);
-  cache.insert(std::move(key), result);
+  cache.insert(std::string(keyView), result);
   return result;
 }
 
