@@ -127,6 +127,7 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
   }
   std::unordered_map<std::string_view, std::shared_ptr<AXPerson>> personForHandle;
   if (friends) {
+    personForHandle.reserve(friends->size());
     for (const auto& person : *friends) {
       if (!person) continue;
       // The first friend that holds a handle, as e-mail address or as phone number, wins.
