@@ -114,20 +114,7 @@ struct FieldWriter {
 struct FieldJsonWriter {
   std::string& out;
 
-  /// `,"key":`, made in one step.
-  void key(std::string_view k) const {
-    char text[64];
-    // Keys are field names of a few letters; a longer one is a programming error that the first
-    // text of its record shows, as with FieldKeys.
-    if (k.size() + 4 > sizeof text) std::abort();
-    text[0] = ',';
-    text[1] = '"';
-    std::memcpy(text + 2, k.data(), k.size());
-    text[k.size() + 2] = '"';
-    text[k.size() + 3] = ':';
-    out.append(text, k.size() + 4);
-  }
-  /// The same for a key written as a literal, as the records' field lists write them: its length
+  /// `,"key":`, made in one step. Keys are the literals of the records' field lists: their length
   /// is known when compiling, so the copy needs no call.
   template <std::size_t N>
   void key(const char (&k)[N]) const {

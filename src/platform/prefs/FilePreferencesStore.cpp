@@ -1,5 +1,6 @@
 #include "platform/fs/Files.h"
 #include "platform/log/Log.h"
+#include "platform/text/ByteClass.h"
 #include "platform/prefs/FilePreferencesStore.h"
 #include "platform/value/Json.h"
 
@@ -10,7 +11,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
 #include <cstring>
 #include <string>
@@ -104,15 +104,10 @@ void removeStaleTemporaries(int dir, const std::string& fileName) {
 FilePreferencesStore::FilePreferencesStore(std::filesystem::path directory) : directory_(std::move(directory)) {}
 
 bool FilePreferencesStore::isValidDomain(std::string_view domain) noexcept {
-  // Every read checks the name: one table look-up per byte.
-  static constexpr auto kAllowed = [] {
-    std::array<bool, 256> table{};
-    for (int c = 0; c < 256; ++c) {
-      table[static_cast<std::size_t>(c)] = (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') ||
-                                           c == '.' || c == '_' || c == '-';
-    }
-    return table;
-  }();
+  // Every read checks the name.
+  static constexpr auto kAllowed = byteClass([](unsigned char c) {
+    return (c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '.' || c == '_' || c == '-';
+  });
   if (domain.empty() || domain.size() > 200 || domain.front() == '.') return false;
   return std::all_of(domain.begin(), domain.end(), [](char c) { return kAllowed[static_cast<unsigned char>(c)]; });
 }

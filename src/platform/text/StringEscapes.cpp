@@ -1,5 +1,7 @@
 #include "platform/text/StringEscapes.h"
 
+#include "platform/text/ByteClass.h"
+
 #include <array>
 #include <charconv>
 #include <cmath>
@@ -55,11 +57,7 @@ Int leadingInteger(std::string_view text) noexcept {
 
 void appendPercentEscaped(std::string& out, std::string_view text) {
   static constexpr char kHex[] = "0123456789ABCDEF";
-  static constexpr auto kUnreserved = [] {
-    std::array<bool, 256> table{};
-    for (int c = 0; c < 256; ++c) table[static_cast<std::size_t>(c)] = isUnreserved(static_cast<unsigned char>(c));
-    return table;
-  }();
+  static constexpr auto kUnreserved = byteClass(isUnreserved);
   std::size_t i = 0;
   while (i < text.size()) {
     std::size_t run = i;

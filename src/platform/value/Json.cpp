@@ -1,5 +1,6 @@
 #include "platform/value/Json.h"
 
+#include "platform/text/ByteClass.h"
 #include "platform/text/StringEscapes.h"
 
 #include <simdjson.h>
@@ -8,7 +9,6 @@
 #include <array>
 #include <atomic>
 #include <charconv>
-#include <climits>
 #include <cstring>
 #include <limits>
 #include <cmath>
@@ -353,11 +353,7 @@ void releaseValue(Value& value) noexcept {
 namespace {
 
 /// The bytes that go into a JSON string as they are: printable ASCII but the quote and the backslash.
-constexpr std::array<bool, UCHAR_MAX + 1> kPlainBytes = [] {
-  std::array<bool, UCHAR_MAX + 1> plain{};
-  for (int c = 0x20; c < 0x80; ++c) plain[c] = c != '"' && c != '\\';
-  return plain;
-}();
+constexpr auto kPlainBytes = byteClass([](unsigned char c) { return c >= 0x20 && c < 0x80 && c != '"' && c != '\\'; });
 
 }  // namespace
 
@@ -659,8 +655,7 @@ bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
 bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
 
 namespace {
-/// `a == b` without the library's three-way comparison, which the member walks notice.
-/// Member names are short: compared eight bytes at a time in place, without a call.
+/// `a == b` for member names, which are short: eight bytes at a time in place, without a call.
 inline bool sameText(std::string_view a, std::string_view b) noexcept {
   if (a.size() != b.size()) return false;
   const char* p = a.data();
