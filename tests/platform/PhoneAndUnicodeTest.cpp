@@ -12,6 +12,8 @@ TEST(PhoneNumbers, CanonicalFormIsOneTextPerNumber) {
   }
   EXPECT_EQ(formatPhoneNumber("030 901820", "de", PhoneNumberStyle::Canonical), "+4930901820");
   EXPECT_EQ(formatPhoneNumber("01 99 00 12 34", "fr", PhoneNumberStyle::Canonical), "+33199001234");
+  // A region no code is as long as: an international number still reads, its cache key too long for the stack.
+  EXPECT_EQ(formatPhoneNumber("+1 408 555 0100", std::string(300, 'x'), PhoneNumberStyle::Canonical), "+14085550100");
 }
 
 TEST(PhoneNumbers, NumbersThatLeftTheCacheOfRecentResultsAreReadAfresh) {
