@@ -2,12 +2,17 @@
 
 #include "platform/value/Json.h"
 
+#include <algorithm>
+#include <atomic>
+
 namespace kyn {
 namespace {
 
-/// Room made for a reply's text at once: most replies fit, and a larger one grows from there in a
-/// few steps rather than many.
+/// Room made for a reply's text at once: at least this much, and as much as the last reply took,
+/// up to the cap, as a user asks much the same thing again and a large text grows by copying.
 constexpr std::size_t kReplyTextReserve = 4096;
+constexpr std::size_t kReplyTextReserveCap = 1u << 20;
+std::atomic<std::size_t> lastReplyTextSize{0};
 
 }  // namespace
 
@@ -44,8 +49,10 @@ void AXObject::appendDescription(std::string& out) const {
 std::string AXReply::json() const {
   if (dictionary_ || !record_) return platform::toJson(dictionary());
   std::string text;
-  text.reserve(kReplyTextReserve);
+  const std::size_t last = lastReplyTextSize.load(std::memory_order_relaxed);
+  text.reserve(std::clamp(last + last / 8, kReplyTextReserve, kReplyTextReserveCap));
   record_->appendJson(text);
+  lastReplyTextSize.store(text.size(), std::memory_order_relaxed);
   return text;
 }
 
