@@ -1,3 +1,4 @@
+#include "platform/text/SameText.h"
 #include "platform/text/StringEscapes.h"
 
 #include <gtest/gtest.h>
@@ -6,6 +7,19 @@
 
 namespace kyn::platform {
 namespace {
+
+TEST(SameText, FindsADifferenceAtEveryPlaceOfEveryShortLength) {
+  for (std::size_t n = 0; n <= 20; ++n) {
+    const std::string a(n, 'k');
+    EXPECT_TRUE(sameText(a, std::string(n, 'k')));
+    EXPECT_FALSE(sameText(a, std::string(n + 1, 'k')));
+    for (std::size_t at = 0; at < n; ++at) {
+      std::string b = a;
+      b[at] = 'K';
+      EXPECT_FALSE(sameText(a, b)) << n << " " << at;
+    }
+  }
+}
 
 TEST(PercentEscape, EscapesQuerySyntaxAndKeepsUnreserved) {
   for (const auto& [text, escaped] : {std::pair{"a&b=c%d", "a%26b%3Dc%25d"}, {"AZaz09-._~", "AZaz09-._~"},

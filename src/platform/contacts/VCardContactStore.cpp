@@ -5,6 +5,7 @@
 #include "platform/log/Log.h"
 #include "platform/phone/PhoneNumbers.h"
 #include "platform/text/StringEscapes.h"
+#include "platform/text/SameText.h"
 #include "platform/text/Unicode.h"
 
 #include <fcntl.h>
@@ -173,6 +174,12 @@ void unify(Contact& into, Contact&& from, std::unique_ptr<SeenEntries>& seen) {
   }
 }
 
+/// `a == b` for key lists, which are asked for on every look-up: short texts compared in place.
+bool sameKeys(const ContactKeys& a, const ContactKeys& b) noexcept {
+  return std::equal(a.begin(), a.end(), b.begin(), b.end(),
+                    [](const std::string& x, const std::string& y) { return sameText(x, y); });
+}
+
 void addToIndex(ContactIndex& index, std::string key, std::uint32_t position) {
   if (key.empty()) return;
   auto& positions = index[std::move(key)];
@@ -200,7 +207,7 @@ struct VCardContactStore::Impl {
 
   std::shared_ptr<const ContactProjection> projectionFor(const ContactKeys& keys) {
     std::lock_guard lock(projectionMutex);
-    if (!lastProjection || lastProjection->keys() != keys) {
+    if (!lastProjection || !sameKeys(lastProjection->keys(), keys)) {
       lastProjection = std::make_shared<const ContactProjection>(keys);
     }
     return lastProjection;

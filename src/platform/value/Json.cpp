@@ -1,6 +1,7 @@
 #include "platform/value/Json.h"
 
 #include "platform/text/ByteClass.h"
+#include "platform/text/SameText.h"
 #include "platform/text/StringEscapes.h"
 
 #include <simdjson.h>
@@ -655,25 +656,6 @@ bool JsonView::isArray() const noexcept { return typeOf(*this) == '['; }
 bool JsonView::isObject() const noexcept { return typeOf(*this) == '{'; }
 
 namespace {
-/// `a == b` for member names, which are short: eight bytes at a time in place, without a call.
-inline bool sameText(std::string_view a, std::string_view b) noexcept {
-  if (a.size() != b.size()) return false;
-  const char* p = a.data();
-  const char* q = b.data();
-  std::size_t n = a.size();
-  for (; n >= 8; n -= 8, p += 8, q += 8) {
-    std::uint64_t x;
-    std::uint64_t y;
-    std::memcpy(&x, p, 8);
-    std::memcpy(&y, q, 8);
-    if (x != y) return false;
-  }
-  for (; n > 0; --n, ++p, ++q) {
-    if (*p != *q) return false;
-  }
-  return true;
-}
-
 /// Calls `visit(name, index of the value)` for each member of the object at `index`, in order.
 template <class Visit>
 void forEachMember(const Document& document, std::size_t index, Visit&& visit) noexcept {
