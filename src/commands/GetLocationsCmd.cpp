@@ -6,13 +6,60 @@
 #include "platform/value/Json.h"
 #include "utils/KYNAXUtils.h"
 
+#include <bit>
+#include <functional>
 #include <type_traits>
-#include <unordered_map>
 #include <utility>
+#include <vector>
 
 namespace kyn {
 
 using platform::services;
+
+namespace {
+
+/// Values by handle in one array (open addressing), without a node per handle: a search looks up
+/// every friend's handle twice. Holds at most the number of handles it was made for, and at least
+/// half its slots stay free.
+template <class V>
+class HandleIndex {
+ public:
+  explicit HandleIndex(std::size_t most) : slots_(std::bit_ceil(std::max<std::size_t>(2 * most, 8))), most_(most) {}
+
+  /// The value of `handle`, made when new; and whether it was. Null when the index is full.
+  std::pair<V*, bool> insert(std::string_view handle) {
+    Slot& slot = slots_[place(handle)];
+    if (slot.used) return {&slot.value, false};
+    if (used_ == most_) return {nullptr, false};
+    slot = Slot{handle, V{}, true};
+    ++used_;
+    return {&slot.value, true};
+  }
+  /// The value of `handle`, or null.
+  [[nodiscard]] const V* find(std::string_view handle) const {
+    const Slot& slot = slots_[place(handle)];
+    return slot.used ? &slot.value : nullptr;
+  }
+
+ private:
+  struct Slot {
+    std::string_view handle;
+    V value{};
+    bool used = false;
+  };
+  /// The slot that holds `handle`, else the free one where it goes.
+  [[nodiscard]] std::size_t place(std::string_view handle) const {
+    const std::size_t mask = slots_.size() - 1;
+    for (std::size_t i = std::hash<std::string_view>{}(handle) & mask;; i = (i + 1) & mask) {
+      if (!slots_[i].used || slots_[i].handle == handle) return i;
+    }
+  }
+  std::vector<Slot> slots_;
+  std::size_t most_;
+  std::size_t used_ = 0;
+};
+
+}  // namespace
 
 std::string GetLocationsCmd::path() const { return std::string(KYNUrlBase) + "getlocations"; }
 
@@ -118,27 +165,37 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
   // Each handle is looked up once: index the entries and the friends first, so that the walk stays
   // linear in the number of friends. Of a handle the answer repeats, the last entry counts, at the
   // place of the first.
-  std::unordered_map<std::string_view, platform::JsonView> entries;
+  HandleIndex<platform::JsonView> entries(locations.size());
   std::vector<std::string_view> entryOrder;
-  entries.reserve(locations.size());
   entryOrder.reserve(locations.size());
   for (const auto& [handle, entry] : locations) {
-    if (entries.insert_or_assign(handle, entry).second) entryOrder.push_back(handle);
+    const auto [value, made] = entries.insert(handle);
+    if (value != nullptr) *value = entry;  // the index holds as many as there are entries
+    if (made) entryOrder.push_back(handle);
   }
-  std::unordered_map<std::string_view, std::shared_ptr<AXPerson>> personForHandle;
+  std::size_t handleCount = 0;
   if (friends) {
-    personForHandle.reserve(friends->size());
+    for (const auto& person : *friends) {
+      if (person && person->emails) handleCount += person->emails->size();
+      if (person && person->phones) handleCount += person->phones->size();
+    }
+  }
+  HandleIndex<const std::shared_ptr<AXPerson>*> personForHandle(handleCount);
+  if (friends) {
     for (const auto& person : *friends) {
       if (!person) continue;
       // The first friend that holds a handle, as e-mail address or as phone number, wins.
+      const auto hold = [&](std::string_view handle) {
+        if (const auto [holder, made] = personForHandle.insert(handle); made) *holder = &person;
+      };
       if (person->emails) {
         for (const auto& e : *person->emails) {
-          if (e && e->emailAddress) personForHandle.emplace(*e->emailAddress, person);
+          if (e && e->emailAddress) hold(*e->emailAddress);
         }
       }
       if (person->phones) {
         for (const auto& p : *person->phones) {
-          if (p && p->number) personForHandle.emplace(*p->number, person);
+          if (p && p->number) hold(*p->number);
         }
       }
     }
@@ -146,12 +203,11 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
 
   found.reserve(handlesToReport.isArray() ? handlesToReport.size() : entryOrder.size());
   auto visit = [&](std::string_view handle) {
-    const auto entryIt = entries.find(handle);
-    const platform::JsonView entry = entryIt == entries.end() ? platform::JsonView() : entryIt->second;
+    const platform::JsonView* entryFound = entries.find(handle);
+    const platform::JsonView entry = entryFound ? *entryFound : platform::JsonView();
     if (platform::integerValue(entry.member("status")) == 411) return;  // not a friend: left out
-    const auto personIt = personForHandle.find(handle);
-    auto person = personIt == personForHandle.end() ? nullptr : personIt->second;
-    KYNAXLocation record(std::string(handle), std::move(person), entry);
+    const auto* const* holder = personForHandle.find(handle);
+    KYNAXLocation record(std::string(handle), holder ? **holder : nullptr, entry);
     if (record.avixLocation) found.push_back(std::move(record.avixLocation));
     atRequestedLocation = platform::boolValue(entry.member("match")).value_or(false);
   };
