@@ -2,10 +2,12 @@
 
 #include "account/Common.h"
 #include "platform/Services.h"
+#include "platform/sysinfo/LinuxSystemInfo.h"
 
 namespace kyn {
 
 std::shared_ptr<AXCommandFailed> accountCheckFailure() {
+  const platform::AccountFileReadOnce readOnce;  // the checks see one version of the account
   Common& common = Common::sharedInstance();
   if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
   common.clearKYNAccount();  // the checks below read the account afresh

@@ -3,6 +3,7 @@
 #include "account/Common.h"
 #include "datasource/KYNAXDataSource.h"
 #include "platform/Services.h"
+#include "platform/sysinfo/LinuxSystemInfo.h"
 
 namespace kyn {
 
@@ -11,6 +12,7 @@ using platform::services;
 std::shared_ptr<AXCommandFailed> KYNAXVisibility::_validate() {
   auto& log = services().log();
   log.notice("KYNAXVisibility validate");
+  const platform::AccountFileReadOnce readOnce;  // the checks see one version of the account
   Common& common = Common::sharedInstance();
   if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
   if (common.isAppRestricted()) {

@@ -100,6 +100,24 @@ TEST_F(SystemInfoTest, ATokenReadOnceIsReadAgainWhenItsFileChanges) {
   EXPECT_FALSE(readApplicationToken(file, later));
 }
 
+TEST_F(SystemInfoTest, AReadOnceScopeKeepsItsFirstReadingOfTheAccountAndNoLonger) {
+  const auto file = configDir->write("account.json", R"({"personId":"P1"})");
+  const auto other = configDir->write("other.json", "{}");
+  {
+    const AccountFileReadOnce scope;
+    EXPECT_EQ(readAccountFile(file)->personId, "P1");
+    configDir->write("account.json", R"({"personId":"P2"})");
+    {
+      const AccountFileReadOnce inner;
+    }  // an inner scope's end does not end the outer one
+    EXPECT_EQ(readAccountFile(file)->personId, "P1");
+    configDir->write("other.json", R"({"personId":"Q2"})");
+    EXPECT_EQ(readAccountFile(other)->personId, "Q2");  // another file is read as it is
+    EXPECT_EQ(readAccountFile(file)->personId, "P1");
+  }
+  EXPECT_EQ(readAccountFile(file)->personId, "P2");
+}
+
 TEST_F(SystemInfoTest, AFileStampShowsEachChangeOnceSettled) {
   const auto file = configDir->write("f", "one");
   fs::last_write_time(file, fs::file_time_type::clock::now() - std::chrono::hours(1));  // changes its ctime

@@ -65,7 +65,38 @@ std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, c
 
 }  // namespace
 
+namespace {
+// The scope of this thread, if any; a plain pointer, so that the plug-in keeps no thread-local
+// object that would have to be destroyed.
+thread_local AccountFileReadOnce* readOnceScope = nullptr;
+
+std::optional<AccountFile> readAccountFileNow(const std::filesystem::path& file);
+}  // namespace
+
+AccountFileReadOnce::AccountFileReadOnce() noexcept : outermost_(readOnceScope == nullptr) {
+  if (outermost_) readOnceScope = this;
+}
+
+AccountFileReadOnce::~AccountFileReadOnce() {
+  if (outermost_) readOnceScope = nullptr;
+}
+
 std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
+  AccountFileReadOnce* const scope = readOnceScope;
+  if (scope == nullptr) return readAccountFileNow(file);
+  if (scope->read_ && scope->file_.native() == file.native()) return scope->account_;
+  auto account = readAccountFileNow(file);
+  if (!scope->read_) {  // the scope keeps the first file it sees; another is read as it is
+    scope->file_ = file;
+    scope->account_ = account;
+    scope->read_ = true;
+  }
+  return account;
+}
+
+namespace {
+
+std::optional<AccountFile> readAccountFileNow(const std::filesystem::path& file) {
   // Every command reads the account afresh; a file whose stamp is unchanged is not read again, and
   // a text is parsed again only when it changed.
   const FileStamp stamp = FileStamp::of(file);
@@ -80,7 +111,7 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   static std::optional<Parsed> last;
   {
     std::lock_guard lock(mutex);
-    if (last && last->path == file && stamp.unchangedSince(last->stamp)) return last->account;
+    if (last && last->path.native() == file.native() && stamp.unchangedSince(last->stamp)) return last->account;
   }
   auto text = readWholeFile(file, kMaxAccountBytes);
   if (!text) {
@@ -89,7 +120,7 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   }
   {
     std::lock_guard lock(mutex);
-    if (last && last->path == file && last->text == *text) {
+    if (last && last->path.native() == file.native() && last->text == *text) {
       last->stamp = stamp;
       return last->account;
     }
@@ -99,6 +130,8 @@ std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
   last = Parsed{file, stamp, std::move(*text), account};
   return account;
 }
+
+}  // namespace
 
 std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile, std::time_t now) {
   if (const char* env = std::getenv("KYN_APP_TOKEN"); env != nullptr && *env != '\0') {
@@ -119,7 +152,8 @@ std::optional<std::string> readApplicationToken(const std::filesystem::path& tok
   const uid_t user = ::geteuid();
   {
     std::lock_guard lock(mutex);
-    if (stamp.exists && last && last->path == tokenFile && last->user == user && stamp.unchangedSince(last->stamp)) {
+    if (stamp.exists && last && last->path.native() == tokenFile.native() && last->user == user &&
+        stamp.unchangedSince(last->stamp)) {
       return last->token;
     }
     last.reset();

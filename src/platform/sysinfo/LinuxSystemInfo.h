@@ -28,6 +28,24 @@ struct AccountFile {
 /// or not a JSON object; a field of the wrong type is logged and read as absent.
 [[nodiscard]] std::optional<AccountFile> readAccountFile(const std::filesystem::path& file);
 
+/// While one lives, this thread reads the account file once (the first file read; another is read
+/// each time): the checks of one command see one version of the account, and look at the disk
+/// once. A scope made inside another adds nothing.
+class AccountFileReadOnce {
+ public:
+  AccountFileReadOnce() noexcept;
+  ~AccountFileReadOnce();
+  AccountFileReadOnce(const AccountFileReadOnce&) = delete;
+  AccountFileReadOnce& operator=(const AccountFileReadOnce&) = delete;
+
+ private:
+  friend std::optional<AccountFile> readAccountFile(const std::filesystem::path& file);
+  bool outermost_;
+  bool read_ = false;
+  std::filesystem::path file_;
+  std::optional<AccountFile> account_;
+};
+
 /// Reads the application token: the environment variable KYN_APP_TOKEN when it is set and not empty,
 /// otherwise the token file. The file must be a regular file owned by this user that no one else may
 /// read or write; any other file is refused with a log line. Surrounding blanks are trimmed; an empty
