@@ -211,35 +211,6 @@ T payloadAt(const Document& document, std::size_t index) noexcept {
   return value;
 }
 
-/// Whether the document keeps the rules that simdjson does not check: the nesting depth bounded,
-/// every number finite.
-bool keepsLimits(const Document& document, std::size_t maxDepth) noexcept {
-  const std::size_t end = static_cast<std::size_t>(document.tape[0] & simdjson::internal::JSON_VALUE_MASK);
-  std::size_t depth = 0;
-  for (std::size_t i = 1; i < end;) {
-    switch (typeAt(document, i)) {
-      case '[':
-      case '{':
-        if (++depth > maxDepth) return false;
-        ++i;
-        break;
-      case ']':
-      case '}':
-        --depth;
-        ++i;
-        break;
-      case 'd':
-        if (!std::isfinite(payloadAt<double>(document, i))) return false;
-        i += 2;
-        break;
-      case 'l':
-      case 'u': i += 2; break;
-      default: ++i;
-    }
-  }
-  return true;
-}
-
 /// Makes the Value of the document's value at `index`: of duplicate keys the last value at the
 /// position of the first (`uniqueMembers`), each value made once. Each container is made at its
 /// final size.
@@ -280,6 +251,8 @@ void convert(const Document& document, std::size_t index, Value& out) {
 /// of text); a larger one gets a parser of its own, so that one large answer does not
 /// hold its memory for good. Keeping it saves nothing measurable at that size.
 constexpr std::size_t kKeptParserBytes = 256u * 1024u;
+/// simdjson keeps room for this many levels at most; a deeper bound is left to nlohmann's reader.
+constexpr std::size_t kMostParserDepth = simdjson::DEFAULT_MAX_DEPTH;
 
 /// Kept objects (parsers, and the storage of documents read by them), lent out one at a time under a
 /// lock. Not thread-local: the plug-in may be unloaded while the host's threads live on, and their
@@ -526,13 +499,20 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
     if (simdjsonMayRead(text)) {
       // simdjson reads several times faster than nlohmann's reader; what it refuses, nlohmann's decides.
       // The parser is lent only for the reading: the document keeps what it read, sized to the text.
+      // It refuses every number that does not fit a double. Set to the depth bound, it refuses a
+      // non-empty container at that depth (an empty one is no level to it): what it reads stays
+      // within the bound, and a text at the bound is left to nlohmann's reader, which decides.
       const bool keep = text.size() <= kKeptParserBytes;
       auto parser = keep ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
+      const std::size_t depth = std::min(limits.maxDepth, kMostParserDepth);
       simdjson::dom::element root;
-      const bool read = parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
+      const bool read =
+          depth > 0 &&
+          (parser->max_depth() == depth ||
+           parser->allocate(std::max(parser->capacity(), text.size()), depth) == simdjson::SUCCESS) &&
+          parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
       if (keep) parserPool().giveBack(std::move(parser));
       if (read) {
-        if (!keepsLimits(storage.document, limits.maxDepth)) return std::nullopt;
         document.root_ = JsonView::inDocument(&storage.document, 1);  // the root word comes first
         return document;
       }
