@@ -63,39 +63,6 @@ std::optional<AccountFile> parseAccountFile(const std::filesystem::path& file, c
   return account;
 }
 
-}  // namespace
-
-namespace {
-// The scope of this thread, if any; a plain pointer, so that the plug-in keeps no thread-local
-// object that would have to be destroyed.
-thread_local AccountFileReadOnce* readOnceScope = nullptr;
-
-std::optional<AccountFile> readAccountFileNow(const std::filesystem::path& file);
-}  // namespace
-
-AccountFileReadOnce::AccountFileReadOnce() noexcept : outermost_(readOnceScope == nullptr) {
-  if (outermost_) readOnceScope = this;
-}
-
-AccountFileReadOnce::~AccountFileReadOnce() {
-  if (outermost_) readOnceScope = nullptr;
-}
-
-std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
-  AccountFileReadOnce* const scope = readOnceScope;
-  if (scope == nullptr) return readAccountFileNow(file);
-  if (scope->read_ && scope->file_.native() == file.native()) return scope->account_;
-  auto account = readAccountFileNow(file);
-  if (!scope->read_) {  // the scope keeps the first file it sees; another is read as it is
-    scope->file_ = file;
-    scope->account_ = account;
-    scope->read_ = true;
-  }
-  return account;
-}
-
-namespace {
-
 std::optional<AccountFile> readAccountFileNow(const std::filesystem::path& file) {
   // Every command reads the account afresh; a file whose stamp is unchanged is not read again, and
   // a text is parsed again only when it changed.
@@ -131,7 +98,32 @@ std::optional<AccountFile> readAccountFileNow(const std::filesystem::path& file)
   return account;
 }
 
+// The scope of this thread, if any; a plain pointer, so that the plug-in keeps no thread-local
+// object that would have to be destroyed.
+thread_local AccountFileReadOnce* readOnceScope = nullptr;
+
 }  // namespace
+
+AccountFileReadOnce::AccountFileReadOnce() noexcept : outermost_(readOnceScope == nullptr) {
+  if (outermost_) readOnceScope = this;
+}
+
+AccountFileReadOnce::~AccountFileReadOnce() {
+  if (outermost_) readOnceScope = nullptr;
+}
+
+std::optional<AccountFile> readAccountFile(const std::filesystem::path& file) {
+  AccountFileReadOnce* const scope = readOnceScope;
+  if (scope == nullptr) return readAccountFileNow(file);
+  if (scope->read_ && scope->file_.native() == file.native()) return scope->account_;
+  auto account = readAccountFileNow(file);
+  if (!scope->read_) {  // the scope keeps the first file it sees; another is read as it is
+    scope->file_ = file;
+    scope->account_ = account;
+    scope->read_ = true;
+  }
+  return account;
+}
 
 std::optional<std::string> readApplicationToken(const std::filesystem::path& tokenFile, std::time_t now) {
   if (const char* env = std::getenv("KYN_APP_TOKEN"); env != nullptr && *env != '\0') {
