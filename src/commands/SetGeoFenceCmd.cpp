@@ -54,7 +54,12 @@ std::string SetGeoFenceCmd::addressString() const {
 }
 
 Value SetGeoFenceCmd::fullAddressDictionaryForAXLocation(const AXLocation& location) const {
+  return fullAddressDictionary(location, addressString());
+}
+
+Value SetGeoFenceCmd::fullAddressDictionary(const AXLocation& location, std::string addressText) {
   Value address = Value::object();
+  platform::reserveMembers(address, 6);
   auto add = [&](const char* key, const std::optional<std::string>& value) {
     if (value) address[key] = *value;
   };
@@ -64,22 +69,24 @@ Value SetGeoFenceCmd::fullAddressDictionaryForAXLocation(const AXLocation& locat
   add("stateCode", location.stateCode);
   add("country", location.countryCode);
   // The postal code travels only inside the formatted line.
-  address["formattedAddressLines"] = Value::array({addressString()});
+  address["formattedAddressLines"] = Value::array({std::move(addressText)});
   return address;
 }
 
 Value SetGeoFenceCmd::jsonBodyDictionary() const {
   Value body = KYNBaseCmd::jsonBodyDictionary();
+  platform::reserveMembers(body, body.size() + 10);  // the members below, at most
   const std::string mappedTrigger = serverTrigger(trigger);
   body["emails"] = allHandles();
   if (auto place = requestedLocationDictionary()) body["requestedLocation"] = std::move(*place);
   if (location_ && location_->label) body["label"] = *location_->label;
   body["isOn"] = flag(enable);
-  body["address"] = addressString();
+  std::string address = addressString();  // made once, for both places that carry it
+  body["address"] = address;
   body["trigger"] = mappedTrigger;
   body["onetimeonly"] = flag(onetimeonly);
   if (location_) {
-    body["fullAddress"] = fullAddressDictionaryForAXLocation(*location_);
+    body["fullAddress"] = fullAddressDictionary(*location_, std::move(address));
     body["locationType"] = "4";  // always an address-kind place
   }
   body["type"] = fenceType == AXKynFenceTypeNotifyMeValue ? "NotifyMe" : "NotifyOthers";

@@ -54,6 +54,9 @@ class SetGeoFenceCmd : public KYNBaseCmd {
   std::optional<std::string> fenceType;  // the assistant's notify-me value, or another
 
  private:
+  /// `fullAddressDictionaryForAXLocation` with the mailing-address text already made.
+  [[nodiscard]] static Value fullAddressDictionary(const AXLocation& location, std::string addressText);
+
   std::shared_ptr<AXLocation> location_;
 };
 

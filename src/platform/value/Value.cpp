@@ -16,4 +16,9 @@ const Value* memberNotNull(const Value* object, std::string_view key) noexcept {
   return (v != nullptr && v->is_null()) ? nullptr : v;
 }
 
+void reserveMembers(Value& object, std::size_t count) {
+  if (object.is_null()) object = Value::object();
+  static_cast<Value::object_t::Container&>(object.get_ref<Value::object_t&>()).reserve(count);
+}
+
 }  // namespace kyn::platform

@@ -28,6 +28,10 @@ namespace platform {
 /// As `member`, but a JSON null counts as absent.
 [[nodiscard]] const Value* memberNotNull(const Value* object, std::string_view key) noexcept;
 
+/// Makes `object` (null becomes an empty object) hold `count` members without growing. An object
+/// copies, rather than moves, its members each time it grows (their keys are const), values and all.
+void reserveMembers(Value& object, std::size_t count);
+
 struct JsonEntry;
 
 /// A read-only look at a JSON value: a Value of a tree, or a value inside a parsed document
