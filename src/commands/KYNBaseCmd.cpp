@@ -27,6 +27,9 @@ Value KYNBaseCmd::headers() const {
 
 Value KYNBaseCmd::jsonBodyDictionary() const {
   Value body = KYJSONCommand::jsonBodyDictionary();
+  // Room for the members of any command's body at once: a body that grows copies what it holds.
+  constexpr std::size_t kBodyMembers = 16;
+  platform::reserveMembers(body, body.size() + kBodyMembers);
   body["clientContext"] = staticClientContext();
   return body;
 }

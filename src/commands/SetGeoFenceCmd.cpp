@@ -75,7 +75,6 @@ Value SetGeoFenceCmd::fullAddressDictionary(const AXLocation& location, std::str
 
 Value SetGeoFenceCmd::jsonBodyDictionary() const {
   Value body = KYNBaseCmd::jsonBodyDictionary();
-  platform::reserveMembers(body, body.size() + 10);  // the members below, at most
   const std::string mappedTrigger = serverTrigger(trigger);
   body["emails"] = allHandles();
   if (auto place = requestedLocationDictionary()) body["requestedLocation"] = std::move(*place);
