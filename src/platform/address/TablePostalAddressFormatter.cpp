@@ -10,6 +10,7 @@
 #include <algorithm>
 #include <array>
 #include <cstdint>
+#include <mutex>
 #include <string_view>
 
 namespace kyn::platform {
@@ -152,6 +153,27 @@ std::string countryDisplayName(const std::string& code, const std::optional<std:
 
 }  // namespace
 
+namespace {
+
+/// The locale whose rules a country's capitals follow: its likely language. ICU takes some ten
+/// thousand instructions to find it, so the last one found is kept.
+icu::Locale caseLocaleOf(const std::string& region) {
+  static std::mutex mutex;
+  static std::string lastRegion;
+  static icu::Locale last;
+  std::lock_guard lock(mutex);
+  if (lastRegion.empty() || region != lastRegion) {
+    icu::Locale locale("und", region.c_str());
+    UErrorCode status = U_ZERO_ERROR;
+    locale.addLikelySubtags(status);
+    last = locale;
+    lastRegion = region;
+  }
+  return last;
+}
+
+}  // namespace
+
 TablePostalAddressFormatter::TablePostalAddressFormatter(TextSource systemRegion, TextSource language)
     : systemRegion_(std::move(systemRegion)), language_(std::move(language)) {}
 
@@ -178,9 +200,7 @@ std::string TablePostalAddressFormatter::stringFromPostalAddress(const PostalAdd
   if (format && !format->layout.empty()) layout = format->layout;
   if (format && !format->latinLayout.empty() && isLatinScript(fields)) layout = format->latinLayout;
   if (format && !format->upper.empty()) {
-    icu::Locale locale("und", region->c_str());
-    UErrorCode status = U_ZERO_ERROR;
-    locale.addLikelySubtags(status);  // the country's language: its own rules for capitals
+    const icu::Locale locale = caseLocaleOf(*region);
     for (const char letter : format->upper) {
       if (kFieldLetters.find(letter) != std::string_view::npos) field(letter).toUpper(locale);
     }
