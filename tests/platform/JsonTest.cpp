@@ -66,7 +66,10 @@ TEST(Json, BoundsDepthAndSize) {
 TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   Value v = Value::object();
   v["name"] = std::string("bad \xFF byte");
+  v["all"] = {{"s", "q\"\\\n\x01\x7F é"}, {"i", -5}, {"u", 18446744073709551615u}, {"d", 30.0}, {"f", 0.1},
+              {"nan", std::nan("")}, {"t", true}, {"n", nullptr}, {"a", {1, Value::array(), Value::object()}}};
   const std::string text = toJson(v);
+  EXPECT_EQ(text, v.dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace));
   EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
   EXPECT_TRUE(parseJson(text));
   const auto written = [](std::string_view input) { std::string out; appendJsonString(out, input); return out; };
@@ -87,7 +90,7 @@ TEST(Json, ANumberIsWrittenAsTheLibraryWritesItOrShorterForTheSameDouble) {
     if (!std::isfinite(value)) continue;
     std::string out;
     appendJsonNumber(out, value);
-    const std::string library = toJson(Value(value));
+    const std::string library = Value(value).dump();
     if (out == library) continue;
     const auto read = parseJson(out);
     ASSERT_TRUE(out.size() < library.size() && read && read->get<double>() == value) << out << " for " << library;

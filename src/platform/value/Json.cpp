@@ -819,9 +819,55 @@ std::int32_t int32Value(JsonView value) noexcept {
   return static_cast<std::int32_t>(static_cast<std::uint32_t>(static_cast<std::uint64_t>(integerValue(value))));
 }
 
+namespace {
+// A tree written as compact JSON, as the library writes it (numbers sometimes in fewer digits),
+// without its writer's set-up per call.
+void appendTree(std::string& out, const Value& value) {
+  switch (value.type()) {
+    case Value::value_t::object: {
+      out += '{';
+      bool first = true;
+      for (const auto& [key, item] : value.items()) {
+        if (!std::exchange(first, false)) out += ',';
+        appendJsonString(out, key);
+        out += ':';
+        appendTree(out, item);
+      }
+      out += '}';
+      return;
+    }
+    case Value::value_t::array: {
+      out += '[';
+      bool first = true;
+      for (const Value& item : value) {
+        if (!std::exchange(first, false)) out += ',';
+        appendTree(out, item);
+      }
+      out += ']';
+      return;
+    }
+    case Value::value_t::string: appendJsonString(out, value.get_ref<const std::string&>()); return;
+    case Value::value_t::boolean: out += value.get<bool>() ? "true" : "false"; return;
+    case Value::value_t::number_integer: appendJsonNumber(out, value.get<std::int64_t>()); return;
+    case Value::value_t::number_unsigned: {
+      char buffer[24];
+      const auto written = std::to_chars(buffer, buffer + sizeof buffer, value.get<std::uint64_t>());
+      out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
+      return;
+    }
+    case Value::value_t::number_float: appendJsonNumber(out, value.get<double>()); return;
+    case Value::value_t::null: out += "null"; return;
+    default: out += value.dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace); return;
+  }
+}
+}  // namespace
+
 std::string toJson(const Value& value, int indent) noexcept {
   try {
-    return value.dump(indent, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+    if (indent >= 0) return value.dump(indent, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+    std::string out;
+    appendTree(out, value);
+    return out;
   } catch (...) {
     return "null";
   }
