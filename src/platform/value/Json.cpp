@@ -611,7 +611,6 @@ struct JsonViewAccess {
   }
   static const Document& document(const JsonView& view) noexcept { return documentOf(view.ptr_); }
   static std::size_t index(const JsonView& view) noexcept { return view.index_; }
-  static bool inDocument(const JsonView& view) noexcept { return view.kind_ == JsonView::Kind::Document; }
 };
 
 namespace {
@@ -875,32 +874,54 @@ std::string toJson(const Value& value, int indent) noexcept {
 
 namespace {
 // A document's value written as compact JSON in document order, without building a tree (the raw
-// answers are logged per command). A repeated key is written as often as it came.
-void appendView(std::string& out, JsonView value) {
-  switch (JsonViewAccess::type(value)) {
-    case '[':
-    case '{': {
-      const bool object = value.isObject();
-      out += object ? '{' : '[';
-      bool first = true;
-      for (const auto& [key, item] : value) {
-        if (!std::exchange(first, false)) out += ',';
-        if (object) {
-          appendJsonString(out, key);
-          out += ':';
-        }
-        appendView(out, item);
-      }
-      out += object ? '}' : ']';
-      return;
+// answers are logged per command). A repeated key is written as often as it came. One pass over
+// the tape: each word is a value, a key or a container's end, and what goes before it (a comma, a
+// colon, nothing) follows from the container it is in and what that container has had so far.
+void appendTape(std::string& out, const Document& document, std::size_t index) {
+  const std::size_t end = after(document, index);
+  // Per open container: kObject, kStarted once it holds something, kValueNext after a key.
+  enum : std::uint8_t { kObject = 1, kStarted = 2, kValueNext = 4 };
+  std::vector<std::uint8_t> open;
+  for (std::size_t i = index; i < end;) {
+    const char type = typeAt(document, i);
+    if (type == '}' || type == ']') {
+      out += type;
+      open.pop_back();
+      ++i;
+      continue;
     }
-    case '"': appendJsonString(out, *value.string()); return;
-    case 't': out += "true"; return;
-    case 'f': out += "false"; return;
-    case 'l': appendJsonNumber(out, JsonViewAccess::number(value).i); return;
-    case 'u': out += std::to_string(JsonViewAccess::number(value).u); return;
-    case 'd': appendJsonNumber(out, JsonViewAccess::number(value).d); return;
-    default: out += "null"; return;
+    if (!open.empty()) {
+      std::uint8_t& state = open.back();
+      if ((state & kValueNext) != 0) {
+        out += ':';
+        state &= ~kValueNext;
+      } else {
+        if ((state & kStarted) != 0) out += ',';
+        state |= kStarted;
+        if ((state & kObject) != 0) state |= kValueNext;  // this word is a key
+      }
+    }
+    switch (type) {
+      case '{':
+      case '[':
+        out += type;
+        open.push_back(type == '{' ? kObject : 0);
+        ++i;
+        continue;
+      case '"': appendJsonString(out, stringAt(document, i)); break;
+      case 't': out += "true"; break;
+      case 'f': out += "false"; break;
+      case 'l': appendJsonNumber(out, payloadAt<std::int64_t>(document, i)); break;
+      case 'u': {
+        char buffer[24];
+        const auto written = std::to_chars(buffer, buffer + sizeof buffer, payloadAt<std::uint64_t>(document, i));
+        out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
+        break;
+      }
+      case 'd': appendJsonNumber(out, payloadAt<double>(document, i)); break;
+      default: out += "null"; break;
+    }
+    i = after(document, i);
   }
 }
 }  // namespace
@@ -910,7 +931,7 @@ std::string toJson(JsonView value, int indent) noexcept {
   try {
     if (indent >= 0 || !value) return toJson(value.toValue(), indent);
     std::string out;
-    appendView(out, value);
+    appendTape(out, JsonViewAccess::document(value), JsonViewAccess::index(value));
     return out;
   } catch (...) {
     return "null";
