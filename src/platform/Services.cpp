@@ -26,10 +26,13 @@ std::optional<std::string> systemLanguageTag() {
 
 Services& Services::shared() {
   // Destruction runs in the reverse order of construction: what the registry's users need while
-  // they are torn down is made first.
-  (void)Log::shared();
-  (void)NotificationCenter::defaultCenter();
-  static Services instance;
+  // they are torn down is made first. Later calls only test that the reference is there.
+  static Services& instance = []() -> Services& {
+    (void)Log::shared();
+    (void)NotificationCenter::defaultCenter();
+    static Services made;
+    return made;
+  }();
   return instance;
 }
 

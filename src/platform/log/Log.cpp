@@ -113,16 +113,15 @@ Log::Log(std::string subsystem, std::string category)
 Log& Log::shared() {
   // Destroyed when the plug-in is unloaded, after every object that was made after it: the services
   // registry makes it first, so that what logs while it is torn down still finds it.
-  static Log log(kSubsystem, kCategory);
-  static const bool configured = [] {
+  static Log& configured = []() -> Log& {
+    static Log log(kSubsystem, kCategory);
     if (const char* env = std::getenv("KYN_LOG_LEVEL")) {
       if (auto level = logLevelFromName(env)) log.setMinimumLevel(*level);
     }
     log.setSink(makeSystemLogSink());
-    return true;
+    return log;
   }();
-  (void)configured;
-  return log;
+  return configured;
 }
 
 std::shared_ptr<LogSink> Log::setSink(std::shared_ptr<LogSink> sink) {
