@@ -151,10 +151,6 @@ std::string countryDisplayName(const std::string& code, const std::optional<std:
   return out;
 }
 
-}  // namespace
-
-namespace {
-
 /// The locale whose rules a country's capitals follow: its likely language. ICU takes some ten
 /// thousand instructions to find it, so the last one found is kept.
 icu::Locale caseLocaleOf(const std::string& region) {

@@ -819,6 +819,12 @@ std::int32_t int32Value(JsonView value) noexcept {
 }
 
 namespace {
+void appendUnsigned(std::string& out, std::uint64_t value) {
+  char buffer[24];
+  const auto written = std::to_chars(buffer, buffer + sizeof buffer, value);
+  out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
+}
+
 // A tree written as compact JSON, as the library writes it (numbers sometimes in fewer digits),
 // without its writer's set-up per call.
 void appendTree(std::string& out, const Value& value) {
@@ -848,12 +854,7 @@ void appendTree(std::string& out, const Value& value) {
     case Value::value_t::string: appendJsonString(out, value.get_ref<const std::string&>()); return;
     case Value::value_t::boolean: out += value.get<bool>() ? "true" : "false"; return;
     case Value::value_t::number_integer: appendJsonNumber(out, value.get<std::int64_t>()); return;
-    case Value::value_t::number_unsigned: {
-      char buffer[24];
-      const auto written = std::to_chars(buffer, buffer + sizeof buffer, value.get<std::uint64_t>());
-      out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
-      return;
-    }
+    case Value::value_t::number_unsigned: appendUnsigned(out, value.get<std::uint64_t>()); return;
     case Value::value_t::number_float: appendJsonNumber(out, value.get<double>()); return;
     case Value::value_t::null: out += "null"; return;
     default: out += value.dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace); return;
@@ -912,12 +913,7 @@ void appendTape(std::string& out, const Document& document, std::size_t index) {
       case 't': out += "true"; break;
       case 'f': out += "false"; break;
       case 'l': appendJsonNumber(out, payloadAt<std::int64_t>(document, i)); break;
-      case 'u': {
-        char buffer[24];
-        const auto written = std::to_chars(buffer, buffer + sizeof buffer, payloadAt<std::uint64_t>(document, i));
-        out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
-        break;
-      }
+      case 'u': appendUnsigned(out, payloadAt<std::uint64_t>(document, i)); break;
       case 'd': appendJsonNumber(out, payloadAt<double>(document, i)); break;
       default: out += "null"; break;
     }
