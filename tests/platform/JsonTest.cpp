@@ -125,6 +125,7 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     EXPECT_EQ(v.toValue(), tree);
     EXPECT_EQ(toJson(v.member("a")), R"([1,{"k":2},"z"])");
     EXPECT_EQ(toJson(v.member("a"), 1), toJson(tree["a"], 1));  // indented as a tree would be
+    EXPECT_EQ(toJson(v.member("a"), 0), "[\n1,\n{\n\"k\": 2\n},\n\"z\"\n]");
     EXPECT_EQ(toJson(v.member("neg")), "-3.2");
   }
   EXPECT_EQ(member(nullptr, "s"), nullptr);

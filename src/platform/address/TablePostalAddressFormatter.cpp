@@ -158,7 +158,7 @@ icu::Locale caseLocaleOf(const std::string& region) {
   static std::string lastRegion;
   static icu::Locale last;
   std::lock_guard lock(mutex);
-  if (lastRegion.empty() || region != lastRegion) {
+  if (region != lastRegion) {  // a region is a code, never empty
     icu::Locale locale("und", region.c_str());
     UErrorCode status = U_ZERO_ERROR;
     locale.addLikelySubtags(status);

@@ -507,7 +507,6 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
       const std::size_t depth = std::min(limits.maxDepth, kMostParserDepth);
       simdjson::dom::element root;
       const bool read =
-          depth > 0 &&
           (parser->max_depth() == depth ||
            parser->allocate(std::max(parser->capacity(), text.size()), depth) == simdjson::SUCCESS) &&
           parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
