@@ -10,7 +10,7 @@ std::shared_ptr<AXCommandFailed> accountCheckFailure() {
   const platform::AccountFileReadOnce readOnce;  // the checks see one version of the account
   Common& common = Common::sharedInstance();
   if (!common.isKYNAllowed()) return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInRegionErrorCode);
-  common.clearKYNAccount();  // the checks below read the account afresh
+  common.clearKYNAccount();  // the checks below read the account anew: this command's one reading
   if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
   if (!platform::services().session.get()->isProvisionedForLocationSharing()) {
     return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceRestrictedInAccountErrorCode);

@@ -21,7 +21,7 @@ std::shared_ptr<AXCommandFailed> KYNAXVisibility::_validate() {
     return AXCommandFailed::commandFailedWithErrorCode(AXKynServiceNotAvailableErrorCode);
   }
   log.notice("KYNAXVisibility clearing KYNAccount");
-  common.clearKYNAccount();  // the checks below read the account afresh
+  common.clearKYNAccount();  // the checks below read the account anew: this command's one reading
   if (!common.hasKYNUser()) return AXCommandFailed::commandFailedWithErrorCode(AXKynNotLoggedInErrorCode);
   log.notice("KYNAXVisibility Checking provisionning");
   if (!services().session.get()->isProvisionedForLocationSharing()) {

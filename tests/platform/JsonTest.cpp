@@ -56,6 +56,9 @@ TEST(Json, BoundsDepthAndSize) {
   for (const char* number : {"1.5", "1", "18446744073709551615"}) {
     EXPECT_FALSE(parseJson(std::string("[") + number + "," + std::string(10, '[') + std::string(11, ']'), limits)) << number;
   }
+  const JsonLimits scalarsOnly{.maxDepth = 0};
+  EXPECT_TRUE(parseJson("1", scalarsOnly));
+  EXPECT_FALSE(parseJson("[]", scalarsOnly) || parseJson("{}", scalarsOnly));
   // Far beyond the default depth: rejected without exhausting the stack.
   EXPECT_FALSE(parseJson(std::string(100000, '[') + std::string(100000, ']')));
   limits.maxBytes = 8;

@@ -5,6 +5,7 @@
 
 #include "platform/sysinfo/SystemInfo.h"
 
+#include <cstddef>
 #include <ctime>
 #include <filesystem>
 #include <optional>
@@ -30,13 +31,15 @@ struct AccountFile {
 
 /// While one lives, this thread reads the account file once (the first file read; another is read
 /// each time): the checks of one command see one version of the account, and look at the disk
-/// once. A scope made inside another adds nothing.
+/// once. A scope made inside another adds nothing. It lives on the stack of the thread it serves.
 class AccountFileReadOnce {
  public:
   AccountFileReadOnce() noexcept;
   ~AccountFileReadOnce();
   AccountFileReadOnce(const AccountFileReadOnce&) = delete;
   AccountFileReadOnce& operator=(const AccountFileReadOnce&) = delete;
+  static void* operator new(std::size_t) = delete;
+  static void* operator new[](std::size_t) = delete;
 
  private:
   friend std::optional<AccountFile> readAccountFile(const std::filesystem::path& file);

@@ -506,7 +506,9 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
       auto parser = keep ? parserPool().take() : std::make_unique<simdjson::dom::parser>();
       const std::size_t depth = std::min(limits.maxDepth, kMostParserDepth);
       simdjson::dom::element root;
+      // A bound of 0 is left to nlohmann's reader: simdjson needs room for the root's level.
       const bool read =
+          depth > 0 &&
           (parser->max_depth() == depth ||
            parser->allocate(std::max(parser->capacity(), text.size()), depth) == simdjson::SUCCESS) &&
           parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
