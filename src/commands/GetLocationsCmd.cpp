@@ -19,18 +19,18 @@ using platform::services;
 namespace {
 
 /// Values by handle in one array (open addressing), without a node per handle: a search looks up
-/// every friend's handle twice. Holds at most the number of handles it was made for, and at least
-/// half its slots stay free.
+/// every friend's handle twice. Made for a number of handles; at least half its slots stay free,
+/// so that every look-up ends.
 template <class V>
 class HandleIndex {
  public:
-  explicit HandleIndex(std::size_t most) : slots_(std::bit_ceil(std::max<std::size_t>(2 * most, 8))), most_(most) {}
+  explicit HandleIndex(std::size_t most) : slots_(std::bit_ceil(std::max<std::size_t>(2 * most, 8))) {}
 
   /// The value of `handle`, made when new; and whether it was. Null when the index is full.
   std::pair<V*, bool> insert(std::string_view handle) {
     Slot& slot = slots_[place(handle)];
     if (slot.used) return {&slot.value, false};
-    if (used_ == most_) return {nullptr, false};
+    if (2 * (used_ + 1) > slots_.size()) return {nullptr, false};
     slot = Slot{handle, V{}, true};
     ++used_;
     return {&slot.value, true};
@@ -55,7 +55,6 @@ class HandleIndex {
     }
   }
   std::vector<Slot> slots_;
-  std::size_t most_;
   std::size_t used_ = 0;
 };
 

@@ -699,26 +699,19 @@ Value JsonView::toValue() const {
   return out;
 }
 
-JsonView::Iterator JsonView::begin() const noexcept {
+JsonView::Iterator JsonView::iteratorAt(bool atEnd) const noexcept {
   Iterator it;
   it.container_ = ptr_;
   it.document_ = kind_ == Kind::Document;
-  const char type = typeOf(*this);
+  const char type = typeOf(*this);  // read once: the type word is what makes a walk cost
   it.object_ = type == '{';
-  if (it.document_ && (type == '{' || type == '[')) it.at_ = index_ + 1;
+  if (it.document_ && (type == '{' || type == '[')) it.at_ = atEnd ? closing(documentOf(ptr_), index_) : index_ + 1;
+  if (atEnd && kind_ == Kind::Tree && tree().is_structured()) it.at_ = tree().size();
   return it;
 }
 
-JsonView::Iterator JsonView::end() const noexcept {
-  Iterator it;
-  it.container_ = ptr_;
-  it.document_ = kind_ == Kind::Document;
-  const char type = typeOf(*this);
-  it.object_ = type == '{';
-  if (kind_ == Kind::Tree && tree().is_structured()) it.at_ = tree().size();
-  if (it.document_ && (type == '{' || type == '[')) it.at_ = closing(documentOf(ptr_), index_);
-  return it;
-}
+JsonView::Iterator JsonView::begin() const noexcept { return iteratorAt(false); }
+JsonView::Iterator JsonView::end() const noexcept { return iteratorAt(true); }
 
 JsonView::Entry JsonView::Iterator::operator*() const noexcept {
   if (!document_) {

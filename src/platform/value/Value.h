@@ -97,6 +97,8 @@ class JsonView {
 
  private:
   friend struct JsonViewAccess;
+  /// An iterator at the first item or member (`atEnd` false), or past the last.
+  [[nodiscard]] Iterator iteratorAt(bool atEnd) const noexcept;
   enum class Kind : std::uint8_t { Absent, Tree, Document };
   [[nodiscard]] const Value& tree() const noexcept { return *static_cast<const Value*>(ptr_); }
   Kind kind_ = Kind::Absent;
