@@ -391,6 +391,43 @@ void appendJsonString(std::string& out, std::string_view text) {
 
 namespace {
 
+/// "00" to "99".
+constexpr auto kDigitPairs = [] {
+  std::array<char, 200> pairs{};
+  for (int i = 0; i < 100; ++i) {
+    pairs[2 * i] = static_cast<char>('0' + i / 10);
+    pairs[2 * i + 1] = static_cast<char>('0' + i % 10);
+  }
+  return pairs;
+}();
+
+/// The decimal `digits` / 10^Places of a double: whole part, point, then the fraction without
+/// its trailing zeros ("30.0", "0.0125"). The fraction is written two digits at a time; the
+/// divisions are by constants, which compile to multiplications.
+template <int Places>
+char* writeScaled(char* p, std::uint64_t digits) noexcept {
+  static_assert(Places % 2 == 0);
+  constexpr std::uint64_t kUnit = [] {
+    std::uint64_t unit = 1;
+    for (int i = 0; i < Places; ++i) unit *= 10;
+    return unit;
+  }();
+  p = std::to_chars(p, p + 20, digits / kUnit).ptr;
+  *p++ = '.';
+  auto fraction = static_cast<std::uint32_t>(digits % kUnit);
+  if (fraction == 0) {
+    *p++ = '0';
+    return p;
+  }
+  for (int i = Places - 2; i >= 0; i -= 2) {
+    std::memcpy(p + i, &kDigitPairs[2 * (fraction % 100)], 2);
+    fraction /= 100;
+  }
+  p += Places;
+  while (p[-1] == '0') --p;  // the fraction is not 0: a digit other than 0 ends the loop
+  return p;
+}
+
 /// Writes `value` when it is a short decimal, as coordinates, distances and times in seconds are:
 /// at most 8 decimals below 2^24, at most 6 below 2^31, and not below 1e-4. Its digits times a power
 /// of ten then give it back exactly, and no other decimal of as many places gives the same double
@@ -398,37 +435,14 @@ namespace {
 /// writes numbers of that size ("12.5", "30.0"). Nothing for any other value.
 char* writeShortDecimal(char* out, double value) noexcept {
   const double magnitude = std::fabs(value);
-  int places;
-  double scale;
-  if (magnitude >= 1e-4 && magnitude < 16777216.0) {
-    places = 8;
-    scale = 1e8;
-  } else if (magnitude >= 16777216.0 && magnitude < 2147483648.0) {
-    places = 6;
-    scale = 1e6;
-  } else {
-    return nullptr;
-  }
+  const bool small = magnitude < 16777216.0;
+  if (magnitude < 1e-4 || magnitude >= 2147483648.0) return nullptr;
+  const double scale = small ? 1e8 : 1e6;
   const double scaled = std::round(magnitude * scale);
   if (scaled / scale != magnitude) return nullptr;
-  char digits[24];
-  char* end = std::to_chars(digits, digits + sizeof digits, static_cast<std::uint64_t>(scaled)).ptr;
-  while (places > 0 && end[-1] == '0') {
-    --end;
-    --places;
-  }
-  const int whole = static_cast<int>(end - digits) - places;  // digits before the point
-  char* p = out;
-  if (value < 0) *p++ = '-';
-  if (whole <= 0) {
-    *p++ = '0';
-    *p++ = '.';
-    p = std::fill_n(p, -whole, '0');
-    return std::copy(digits, end, p);
-  }
-  p = std::copy(digits, digits + whole, p);
-  *p++ = '.';
-  return places == 0 ? (*p++ = '0', p) : std::copy(digits + whole, end, p);
+  if (value < 0) *out++ = '-';
+  const auto digits = static_cast<std::uint64_t>(scaled);
+  return small ? writeScaled<8>(out, digits) : writeScaled<6>(out, digits);
 }
 
 }  // namespace
