@@ -117,31 +117,34 @@ Value GetLocationsCmd::jsonBodyDictionary() const {
 
 std::string GetLocationsCmd::jsonBody() const {
   // The base's members as text, then this command's after them: the text of the whole dictionary.
-  std::string out = platform::toJson(KYNBaseCmd::jsonBodyDictionary());
-  out.pop_back();  // the closing brace
-  bool first = out.size() == 1;
-  bodyMembers([&](const char* key, const auto& value) {
-    if (!first) out += ',';
-    first = false;
-    out += '"';
-    out += key;  // a plain identifier
-    out += "\":";
-    using T = std::decay_t<decltype(value)>;
-    if constexpr (std::is_same_v<T, std::string>) {
-      platform::appendJsonString(out, value);
-    } else if constexpr (std::is_same_v<T, std::vector<std::string>>) {
-      out += '[';
-      for (std::size_t i = 0; i < value.size(); ++i) {
-        if (i > 0) out += ',';
-        platform::appendJsonString(out, value[i]);
+  std::string text = platform::toJson(KYNBaseCmd::jsonBodyDictionary());
+  text.pop_back();  // the closing brace
+  bool first = text.size() == 1;
+  {
+    platform::JsonTextWriter out(text);
+    bodyMembers([&](const char* key, const auto& value) {
+      if (!first) out += ',';
+      first = false;
+      out += '"';
+      out += key;  // a plain identifier
+      out += "\":";
+      using T = std::decay_t<decltype(value)>;
+      if constexpr (std::is_same_v<T, std::string>) {
+        out.string(value);
+      } else if constexpr (std::is_same_v<T, std::vector<std::string>>) {
+        out += '[';
+        for (std::size_t i = 0; i < value.size(); ++i) {
+          if (i > 0) out += ',';
+          out.string(value[i]);
+        }
+        out += ']';
+      } else {
+        out += platform::toJson(value);
       }
-      out += ']';
-    } else {
-      out += platform::toJson(value);
-    }
-  });
-  out += '}';
-  return out;
+    });
+    out += '}';
+  }
+  return text;
 }
 
 AXArray<AXKynLocation> GetLocationsCmd::result() {

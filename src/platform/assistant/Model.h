@@ -59,7 +59,12 @@ class AXObject : public platform::Object {
   [[nodiscard]] virtual Value dictionary() const = 0;
   /// Appends the dictionary as JSON text, written from the fields without making the dictionary:
   /// the same JSON as `toJson(dictionary())`, numbers sometimes in fewer digits.
-  virtual void appendJson(std::string& out) const = 0;
+  void appendJson(std::string& out) const {
+    platform::JsonTextWriter writer(out);
+    writeJson(writer);
+  }
+  /// The same through a writer, which nested records share.
+  virtual void writeJson(platform::JsonTextWriter& out) const = 0;
   /// "<ClassName {dictionary}>"
   [[nodiscard]] std::string description() const override;
   void appendDescription(std::string& out) const override;
@@ -112,7 +117,7 @@ struct FieldWriter {
 /// Writes present fields as JSON text by the rules of FieldWriter. Each follows the "class" member,
 /// hence the leading comma; the keys are plain identifiers and need no escaping.
 struct FieldJsonWriter {
-  std::string& out;
+  platform::JsonTextWriter& out;
 
   /// `,"key":`, made in one step. Keys are the literals of the records' field lists: their length
   /// is known when compiling, so the copy needs no call.
@@ -124,19 +129,19 @@ struct FieldJsonWriter {
     std::memcpy(text + 2, k, N - 1);
     text[N + 1] = '"';
     text[N + 2] = ':';
-    out.append(text, N + 3);
+    out += std::string_view(text, N + 3);
   }
   template <class Key>
   void operator()(const Key& k, const std::optional<std::string>& v) const {
     if (!v) return;
     key(k);
-    platform::appendJsonString(out, *v);
+    out.string(*v);
   }
   template <class Key>
   void operator()(const Key& k, const std::optional<double>& v) const {
     if (!v || !std::isfinite(*v)) return;
     key(k);
-    platform::appendJsonNumber(out, *v);
+    out.number(*v);
   }
   template <class Key>
   void operator()(const Key& k, const std::optional<bool>& v) const {
@@ -148,13 +153,13 @@ struct FieldJsonWriter {
   void operator()(const Key& k, const std::optional<std::int64_t>& v) const {
     if (!v) return;
     key(k);
-    platform::appendJsonNumber(out, *v);
+    out.number(*v);
   }
   template <class Key, class T>
   void operator()(const Key& k, const std::shared_ptr<T>& v) const {
     if (!v) return;
     key(k);
-    v->appendJson(out);
+    v->writeJson(out);
   }
   template <class Key, class T>
   void operator()(const Key& k, const AXArray<T>& v) const {
@@ -166,7 +171,7 @@ struct FieldJsonWriter {
       if (!item) continue;
       if (!first) out += ',';
       first = false;
-      item->appendJson(out);
+      item->writeJson(out);
     }
     out += ']';
   }
@@ -266,7 +271,7 @@ class AXRecord : public AXObject {
     return out;
   }
 
-  void appendJson(std::string& out) const override {
+  void writeJson(platform::JsonTextWriter& out) const override {
     // `{"class":"<name>"`, made in one step; the name is a plain identifier.
     static constexpr auto header = [] {
       constexpr std::string_view open = "{\"class\":\"";
@@ -276,7 +281,7 @@ class AXRecord : public AXObject {
       text.back() = '"';
       return text;
     }();
-    out.append(header.data(), header.size());
+    out += std::string_view(header.data(), header.size());
     detail::FieldJsonWriter writer{out};
     Derived::fields(static_cast<const Derived&>(*this), writer);
     out += '}';

@@ -331,63 +331,63 @@ constexpr auto kPlainBytes = byteClass([](unsigned char c) { return c >= 0x20 &&
 
 }  // namespace
 
-void appendJsonString(std::string& out, std::string_view text) {
-  // Most texts are plain ASCII: they are copied between their quotes in one step. Of the others,
-  // the plain start is not looked at again.
+void JsonTextWriter::grow(std::size_t n) {
+  // Up to the capacity the string has, else by what appending would have grown it; each byte is
+  // cleared once, then written.
+  constexpr std::size_t kStep = 4096;
+  const std::size_t needed = at_ + n;
+  const std::size_t capacity = out_.capacity();
+  out_.resize(needed > capacity ? std::max(needed, 2 * capacity) : std::max(needed, std::min(capacity, at_ + kStep)));
+}
+
+void JsonTextWriter::string(std::string_view text) {
+  // Most texts are plain ASCII: copied in one step. Of the others, the plain start is not looked
+  // at again. Room is made for the worst case of the rest: every byte written as \u00XX.
   const auto special = std::find_if(text.begin(), text.end(), [](char c) { return !kPlainBytes[static_cast<unsigned char>(c)]; });
-  if (special == text.end()) {
-    constexpr std::size_t kShort = 62;  // most texts: written, quotes and all, in one append
-    if (text.size() <= kShort) {
-      char quoted[kShort + 2];
-      quoted[0] = '"';
-      std::memcpy(quoted + 1, text.data(), text.size());
-      quoted[text.size() + 1] = '"';
-      out.append(quoted, text.size() + 2);
-      return;
-    }
-    out += '"';
-    out.append(text);
-    out += '"';
-    return;
-  }
-  const std::size_t start = out.size();
-  out += '"';
+  const auto plain = static_cast<std::size_t>(special - text.begin());
+  char* const start = room(plain + 6 * (text.size() - plain) + 2);
+  char* p = start;
+  *p++ = '"';
+  std::char_traits<char>::copy(p, text.data(), plain);
+  p += plain;
   bool checked = false;  // the whole text has been found to be valid UTF-8
-  std::size_t run = 0;   // where the characters not yet written begin
-  for (auto i = static_cast<std::size_t>(special - text.begin()); i < text.size(); ++i) {
+  for (std::size_t i = plain; i < text.size(); ++i) {
     const auto c = static_cast<unsigned char>(text[i]);
+    if (kPlainBytes[c]) {
+      *p++ = static_cast<char>(c);
+      continue;
+    }
     if (c >= 0x80) {
-      if (checked) continue;
-      if (!isValidUtf8(text.substr(i))) {
+      if (!checked && !isValidUtf8(text.substr(i))) {
         // Rare: the library's own writer decides how each bad byte is replaced.
-        out.resize(start);
-        out += Value(std::string(text)).dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
+        *this += Value(std::string(text)).dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
         return;
       }
       checked = true;
+      *p++ = static_cast<char>(c);
       continue;
     }
-    if (kPlainBytes[c]) continue;
-    out.append(text.data() + run, i - run);
-    run = i + 1;
+    *p++ = '\\';
     switch (c) {
-      case '"': out += "\\\""; break;
-      case '\\': out += "\\\\"; break;
-      case '\b': out += "\\b"; break;
-      case '\f': out += "\\f"; break;
-      case '\n': out += "\\n"; break;
-      case '\r': out += "\\r"; break;
-      case '\t': out += "\\t"; break;
+      case '"': *p++ = '"'; break;
+      case '\\': *p++ = '\\'; break;
+      case '\b': *p++ = 'b'; break;
+      case '\f': *p++ = 'f'; break;
+      case '\n': *p++ = 'n'; break;
+      case '\r': *p++ = 'r'; break;
+      case '\t': *p++ = 't'; break;
       default: {
         static constexpr char kHex[] = "0123456789abcdef";
-        const char escaped[] = {'\\', 'u', '0', '0', kHex[c >> 4], kHex[c & 0xF]};
-        out.append(escaped, sizeof escaped);
+        const char escaped[] = {'u', '0', '0', kHex[c >> 4], kHex[c & 0xF]};
+        p = std::copy(escaped, escaped + sizeof escaped, p);
       }
     }
   }
-  out.append(text.data() + run, text.size() - run);
-  out += '"';
+  *p++ = '"';
+  at_ += static_cast<std::size_t>(p - start);
 }
+
+void appendJsonString(std::string& out, std::string_view text) { JsonTextWriter(out).string(text); }
 
 namespace {
 
@@ -447,23 +447,34 @@ char* writeShortDecimal(char* out, double value) noexcept {
 
 }  // namespace
 
-void appendJsonNumber(std::string& out, double value) {
+void JsonTextWriter::number(double value) {
   if (!std::isfinite(value)) {
-    out += "null";
+    *this += "null";
     return;
   }
-  char buffer[64];
-  const char* end = writeShortDecimal(buffer, value);
+  constexpr std::size_t kMost = 32;  // the longest form is "-2.2250738585072014e-308", 24 bytes
+  char* const start = room(kMost);
+  const char* end = writeShortDecimal(start, value);
   // Otherwise the library's own shortest form, the one `toJson` writes.
-  if (end == nullptr) end = nlohmann::detail::to_chars(buffer, buffer + sizeof buffer, value);
-  out.append(buffer, static_cast<std::size_t>(end - buffer));
+  if (end == nullptr) end = nlohmann::detail::to_chars(start, start + kMost, value);
+  at_ += static_cast<std::size_t>(end - start);
 }
 
-void appendJsonNumber(std::string& out, std::int64_t value) {
-  char buffer[24];
-  const auto result = std::to_chars(buffer, buffer + sizeof buffer, value);
-  out.append(buffer, static_cast<std::size_t>(result.ptr - buffer));
+void JsonTextWriter::number(std::int64_t value) {
+  constexpr std::size_t kMost = 20;
+  char* const start = room(kMost);
+  at_ += static_cast<std::size_t>(std::to_chars(start, start + kMost, value).ptr - start);
 }
+
+void JsonTextWriter::number(std::uint64_t value) {
+  constexpr std::size_t kMost = 20;
+  char* const start = room(kMost);
+  at_ += static_cast<std::size_t>(std::to_chars(start, start + kMost, value).ptr - start);
+}
+
+void appendJsonNumber(std::string& out, double value) { JsonTextWriter(out).number(value); }
+
+void appendJsonNumber(std::string& out, std::int64_t value) { JsonTextWriter(out).number(value); }
 
 struct JsonDocument::Storage {
   Document document;  // what simdjson read
@@ -827,22 +838,16 @@ std::int32_t int32Value(JsonView value) noexcept {
 }
 
 namespace {
-void appendUnsigned(std::string& out, std::uint64_t value) {
-  char buffer[24];
-  const auto written = std::to_chars(buffer, buffer + sizeof buffer, value);
-  out.append(buffer, static_cast<std::size_t>(written.ptr - buffer));
-}
-
 // A tree written as compact JSON, as the library writes it (numbers sometimes in fewer digits),
 // without its writer's set-up per call.
-void appendTree(std::string& out, const Value& value) {
+void appendTree(JsonTextWriter& out, const Value& value) {
   switch (value.type()) {
     case Value::value_t::object: {
       out += '{';
       bool first = true;
       for (const auto& [key, item] : value.items()) {
         if (!std::exchange(first, false)) out += ',';
-        appendJsonString(out, key);
+        out.string(key);
         out += ':';
         appendTree(out, item);
       }
@@ -859,11 +864,11 @@ void appendTree(std::string& out, const Value& value) {
       out += ']';
       return;
     }
-    case Value::value_t::string: appendJsonString(out, value.get_ref<const std::string&>()); return;
+    case Value::value_t::string: out.string(value.get_ref<const std::string&>()); return;
     case Value::value_t::boolean: out += value.get<bool>() ? "true" : "false"; return;
-    case Value::value_t::number_integer: appendJsonNumber(out, value.get<std::int64_t>()); return;
-    case Value::value_t::number_unsigned: appendUnsigned(out, value.get<std::uint64_t>()); return;
-    case Value::value_t::number_float: appendJsonNumber(out, value.get<double>()); return;
+    case Value::value_t::number_integer: out.number(value.get<std::int64_t>()); return;
+    case Value::value_t::number_unsigned: out.number(value.get<std::uint64_t>()); return;
+    case Value::value_t::number_float: out.number(value.get<double>()); return;
     case Value::value_t::null: out += "null"; return;
     default: out += value.dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace); return;
   }
@@ -874,7 +879,10 @@ std::string toJson(const Value& value, int indent) noexcept {
   try {
     if (indent >= 0) return value.dump(indent, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace);
     std::string out;
-    appendTree(out, value);
+    {
+      JsonTextWriter writer(out);
+      appendTree(writer, value);
+    }
     return out;
   } catch (...) {
     return "null";
@@ -886,7 +894,7 @@ namespace {
 // answers are logged per command). A repeated key is written as often as it came. One pass over
 // the tape: each word is a value, a key or a container's end, and what goes before it (a comma, a
 // colon, nothing) follows from the container it is in and what that container has had so far.
-void appendTape(std::string& out, const Document& document, std::size_t index) {
+void appendTape(JsonTextWriter& out, const Document& document, std::size_t index) {
   const std::size_t end = after(document, index);
   // Per open container: kObject, kStarted once it holds something, kValueNext after a key.
   enum : std::uint8_t { kObject = 1, kStarted = 2, kValueNext = 4 };
@@ -917,12 +925,12 @@ void appendTape(std::string& out, const Document& document, std::size_t index) {
         open.push_back(type == '{' ? kObject : 0);
         ++i;
         continue;
-      case '"': appendJsonString(out, stringAt(document, i)); break;
+      case '"': out.string(stringAt(document, i)); break;
       case 't': out += "true"; break;
       case 'f': out += "false"; break;
-      case 'l': appendJsonNumber(out, payloadAt<std::int64_t>(document, i)); break;
-      case 'u': appendUnsigned(out, payloadAt<std::uint64_t>(document, i)); break;
-      case 'd': appendJsonNumber(out, payloadAt<double>(document, i)); break;
+      case 'l': out.number(payloadAt<std::int64_t>(document, i)); break;
+      case 'u': out.number(payloadAt<std::uint64_t>(document, i)); break;
+      case 'd': out.number(payloadAt<double>(document, i)); break;
       default: out += "null"; break;
     }
     i = after(document, i);
@@ -935,7 +943,10 @@ std::string toJson(JsonView value, int indent) noexcept {
   try {
     if (indent >= 0 || !value) return toJson(value.toValue(), indent);
     std::string out;
-    appendTape(out, JsonViewAccess::document(value), JsonViewAccess::index(value));
+    {
+      JsonTextWriter writer(out);
+      appendTape(writer, JsonViewAccess::document(value), JsonViewAccess::index(value));
+    }
     return out;
   } catch (...) {
     return "null";

@@ -63,6 +63,46 @@ void releaseValue(Value& value) noexcept;
 // the same string or number, except that a number is sometimes written in fewer digits than the
 // library's (which are not always the fewest), for the same double.
 
+/// Writes JSON text at the end of a string through a cursor. Room is made ahead in steps, so that
+/// a piece costs a comparison and a copy rather than a string append; when the writer goes, the
+/// string is cut back to what was written. Meant for one text written piece by piece: a writer
+/// per piece would make room each time.
+class JsonTextWriter {
+ public:
+  explicit JsonTextWriter(std::string& out) noexcept : out_(out), at_(out.size()) {}
+  ~JsonTextWriter() { out_.resize(at_); }
+  JsonTextWriter(const JsonTextWriter&) = delete;
+  JsonTextWriter& operator=(const JsonTextWriter&) = delete;
+
+  JsonTextWriter& operator+=(char c) {
+    *room(1) = c;
+    ++at_;
+    return *this;
+  }
+  JsonTextWriter& operator+=(std::string_view text) {
+    std::char_traits<char>::copy(room(text.size()), text.data(), text.size());
+    at_ += text.size();
+    return *this;
+  }
+  /// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
+  void string(std::string_view text);
+  /// A number; "null" for NaN and infinity.
+  void number(double value);
+  void number(std::int64_t value);
+  void number(std::uint64_t value);
+
+ private:
+  /// Where `n` more bytes go.
+  char* room(std::size_t n) {
+    if (out_.size() - at_ < n) grow(n);
+    return out_.data() + at_;
+  }
+  void grow(std::size_t n);
+
+  std::string& out_;
+  std::size_t at_;  // the end of what was written; the string's bytes after it are room
+};
+
 /// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
 void appendJsonString(std::string& out, std::string_view text);
 /// A number; "null" for NaN and infinity.
