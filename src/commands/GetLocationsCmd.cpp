@@ -6,6 +6,7 @@
 #include "platform/value/Json.h"
 #include "utils/KYNAXUtils.h"
 
+#include <array>
 #include <bit>
 #include <functional>
 #include <type_traits>
@@ -207,11 +208,14 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
   auto visit = [&](std::string_view handle) {
     const platform::JsonView* entryFound = entries.find(handle);
     const platform::JsonView entry = entryFound ? *entryFound : platform::JsonView();
-    if (platform::integerValue(entry.member("status")) == 411) return;  // not a friend: left out
+    static constexpr std::array<std::string_view, 2> kKeys{"status", "match"};
+    std::array<platform::JsonView, kKeys.size()> read;
+    entry.members(kKeys, read);
+    if (platform::integerValue(read[0]) == 411) return;  // not a friend: left out
     const auto* const* holder = personForHandle.find(handle);
     KYNAXLocation record(std::string(handle), holder ? **holder : nullptr, entry);
     if (record.avixLocation) found.push_back(std::move(record.avixLocation));
-    atRequestedLocation = platform::boolValue(entry.member("match")).value_or(false);
+    atRequestedLocation = platform::boolValue(read[1]).value_or(false);
   };
 
   if (handlesToReport.isArray() && handlesToReport.size() > 0) {

@@ -19,12 +19,6 @@ namespace {
 /// The distance calculator's own preferences domain.
 constexpr std::string_view kDistanceCalculatorSuiteName = "group.com.zanto.aerix.ky";
 
-/// A member that must be a JSON object to be read; anything else (null included) is absent.
-platform::JsonView objectMember(platform::JsonView object, std::string_view key) {
-  const platform::JsonView v = object.member(key);
-  return v.isObject() ? v : platform::JsonView();
-}
-
 }  // namespace
 
 KYNAXLocation::KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
@@ -65,15 +59,19 @@ void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_
   attribute->data = std::move(handle);
   location->friend_ = attribute;
 
-  if (const platform::JsonView distance = entry.member("distanceInMeters")) {
+  // Each object's members are read in one walk over it.
+  static constexpr std::array<std::string_view, 2> entryKeys{"distanceInMeters", "location"};
+  std::array<platform::JsonView, entryKeys.size()> entryRead;
+  entry.members(entryKeys, entryRead);
+  if (const platform::JsonView distance = entryRead[0]) {
     // The server sends the distance as text; it is read as the user's locale writes numbers.
     // A value that is no text reads as no distance.
     const auto written = distance.string();
     location->distance = written ? numberFormatter()->parseDecimal(*written) : std::nullopt;
   }
 
-  const platform::JsonView fix = objectMember(entry, "location");
-  // Each object's members are read in one walk over it.
+  // A location that is no JSON object (null included) is absent.
+  const platform::JsonView fix = entryRead[1].isObject() ? entryRead[1] : platform::JsonView();
   enum { kAddress, kLatitude, kLongitude, kAccuracy, kTimestamp, kStreet, kLabels, kFixKeys };
   static constexpr std::array<std::string_view, kFixKeys> fixKeys{
       "address", "latitude", "longitude", "horizontalAccuracy", "timestamp", "streetAddress", "labels"};
