@@ -42,7 +42,14 @@ JsonView KYJSONCommand::jsonResponse() { return parsedResponse_ ? parsedResponse
 double KYJSONCommand::minCallbackInterval() { return 0.0; }
 
 void KYJSONCommand::setResponseBody(std::string_view body, const JsonLimits& limits) {
-  auto parsed = parseJsonDocument(body, limits);
+  keepResponse(parseJsonDocument(body, limits));
+}
+
+void KYJSONCommand::setResponseBody(std::string& body, const JsonLimits& limits) {
+  keepResponse(parseJsonDocumentInPlace(body, limits));
+}
+
+void KYJSONCommand::keepResponse(std::optional<JsonDocument> parsed) {
   if (parsed && parsed->root().isObject()) parsedResponse_ = std::make_shared<const JsonDocument>(std::move(*parsed));
   else parsedResponse_.reset();
 }

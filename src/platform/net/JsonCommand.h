@@ -106,6 +106,9 @@ class KYJSONCommand : public Object {
   }
   /// Keeps the response body, parsed within `limits`; a body that is not a JSON object reads as none.
   void setResponseBody(std::string_view body, const JsonLimits& limits = {});
+  /// The same for a body that may be given room after its end, which saves a copy of it: its text
+  /// stays as it is, its capacity may grow.
+  void setResponseBody(std::string& body, const JsonLimits& limits = {});
   void setRedirect(std::string originalHost, std::string redirectedHost) {
     redirected_ = true;
     originalHost_ = std::move(originalHost);
@@ -126,6 +129,9 @@ class KYJSONCommand : public Object {
   [[nodiscard]] std::string description() const override;
 
  private:
+  /// Keeps a parsed body that is a JSON object; anything else reads as none.
+  void keepResponse(std::optional<JsonDocument> parsed);
+
   std::string scheme_ = "https";
   std::optional<std::string> host_;
   std::optional<std::string> username_;

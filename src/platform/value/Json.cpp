@@ -512,7 +512,9 @@ JsonDocument& JsonDocument::operator=(JsonDocument&& other) noexcept {
   return *this;
 }
 
-std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept {
+// With `padded`, the text is followed by room that simdjson may read, and it reads the text where
+// it is instead of copying it first.
+std::optional<JsonDocument> JsonDocument::read(std::string_view text, const JsonLimits& limits, bool padded) noexcept {
   if (text.size() > limits.maxBytes) return std::nullopt;
   // nlohmann's lexer takes a NUL byte for the end of the input and would ignore whatever follows
   // it; a raw NUL is valid nowhere in JSON, so such a text is refused outright.
@@ -536,7 +538,8 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
           depth > 0 &&
           (parser->max_depth() == depth ||
            parser->allocate(std::max(parser->capacity(), text.size()), depth) == simdjson::SUCCESS) &&
-          parser->parse_into_document(storage.document, text.data(), text.size()).get(root) == simdjson::SUCCESS;
+          parser->parse_into_document(storage.document, text.data(), text.size(), /*realloc_if_needed=*/!padded)
+                  .get(root) == simdjson::SUCCESS;
       if (keep) parserPool().giveBack(std::move(parser));
       if (read) {
         document.root_ = JsonView::inDocument(&storage.document, 1);  // the root word comes first
@@ -553,6 +556,22 @@ std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonL
   } catch (...) {
     return std::nullopt;
   }
+}
+
+std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept {
+  return JsonDocument::read(text, limits, /*padded=*/false);
+}
+
+std::optional<JsonDocument> parseJsonDocumentInPlace(std::string& text, const JsonLimits& limits) noexcept {
+  try {
+    // The room is written once, so that what simdjson reads there has a value.
+    const std::size_t size = text.size();
+    text.append(simdjson::SIMDJSON_PADDING, ' ');
+    text.resize(size);
+  } catch (...) {
+    return JsonDocument::read(text, limits, /*padded=*/false);
+  }
+  return JsonDocument::read(text, limits, /*padded=*/true);
 }
 
 std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept {

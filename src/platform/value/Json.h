@@ -41,6 +41,9 @@ class JsonDocument {
 
  private:
   friend std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits) noexcept;
+  friend std::optional<JsonDocument> parseJsonDocumentInPlace(std::string& text, const JsonLimits& limits) noexcept;
+  /// The reading of both; with `padded`, room that may be read follows the text.
+  static std::optional<JsonDocument> read(std::string_view text, const JsonLimits& limits, bool padded) noexcept;
   friend std::optional<Value> parseJson(std::string_view text, const JsonLimits& limits) noexcept;
   std::unique_ptr<Storage> storage_;
   JsonView root_;
@@ -48,6 +51,9 @@ class JsonDocument {
 
 /// Parses a JSON text by the rules of `parseJson` into a document.
 [[nodiscard]] std::optional<JsonDocument> parseJsonDocument(std::string_view text, const JsonLimits& limits = {}) noexcept;
+/// The same for a text that may be given room after its end, which saves copying it before
+/// reading: the text stays as it is, its capacity may grow.
+[[nodiscard]] std::optional<JsonDocument> parseJsonDocumentInPlace(std::string& text, const JsonLimits& limits = {}) noexcept;
 
 /// Serialises a value. Invalid UTF-8 in strings is replaced by U+FFFD; never throws.
 [[nodiscard]] std::string toJson(const Value& value, int indent = -1) noexcept;
