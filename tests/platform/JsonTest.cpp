@@ -79,6 +79,17 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   EXPECT_EQ(written("a\x01" "b\x1F"), R"("a\u0001b\u001f")");  // 0x1F: the last control character
   EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
   EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
+  // Texts are scanned a word at a time: every byte that needs care, at every place of texts up to
+  // three words long, is written as the library writes it.
+  for (std::size_t size = 1; size <= 24; ++size) {
+    for (std::size_t at = 0; at < size; ++at) {
+      for (const char special : {'\x00', '\x1F', '"', '\\', '\x7F', '\x80', '\xFF', ' '}) {
+        std::string sample(size, '~');
+        sample[at] = special;
+        ASSERT_EQ(written(sample), Value(sample).dump(-1, ' ', false, Value::error_handler_t::replace)) << size << " " << at;
+      }
+    }
+  }
 }
 
 TEST(Json, ANumberIsWrittenAsTheLibraryWritesItOrShorterForTheSameDouble) {

@@ -9,6 +9,7 @@
 #include <algorithm>
 #include <array>
 #include <atomic>
+#include <bit>
 #include <charconv>
 #include <cstring>
 #include <limits>
@@ -329,6 +330,50 @@ namespace {
 /// The bytes that go into a JSON string as they are: printable ASCII but the quote and the backslash.
 constexpr auto kPlainBytes = byteClass([](unsigned char c) { return c >= 0x20 && c < 0x80 && c != '"' && c != '\\'; });
 
+/// Where a word has a byte that does not go into a JSON string as it is (below 0x20, the quote, the
+/// backslash, 0x80 and up): the high bit of each such byte is set. The lowest one set is exact, as a
+/// borrow only runs upwards from a byte that is set itself.
+constexpr std::uint64_t specialBytes(std::uint64_t w) noexcept {
+  constexpr std::uint64_t kOnes = 0x0101010101010101u;
+  constexpr std::uint64_t kHighs = 0x8080808080808080u;
+  const auto zeroBytes = [](std::uint64_t x) { return (x - kOnes) & ~x & kHighs; };
+  const std::uint64_t control = (w - kOnes * 0x20) & ~w & kHighs;
+  return control | zeroBytes(w ^ (kOnes * '"')) | zeroBytes(w ^ (kOnes * '\\')) | (w & kHighs);
+}
+
+/// How many bytes at the start of `text` go into a JSON string as they are: eight at a time, the
+/// last ones in a word that overlaps the ones before (which are plain, so the first special byte it
+/// shows is the first of the text), without a call.
+std::size_t plainPrefix(std::string_view text) noexcept {
+  static_assert(std::endian::native == std::endian::little, "the first byte is the lowest");
+  const char* const p = text.data();
+  const std::size_t n = text.size();
+  const auto firstIn = [](std::uint64_t special) { return static_cast<std::size_t>(std::countr_zero(special)) / 8; };
+  if (n >= 8) {
+    std::uint64_t word;
+    for (std::size_t i = 0; i + 8 < n; i += 8) {
+      std::memcpy(&word, p + i, sizeof word);
+      if (const std::uint64_t special = specialBytes(word); special != 0) return i + firstIn(special);
+    }
+    std::memcpy(&word, p + n - 8, sizeof word);
+    const std::uint64_t special = specialBytes(word);
+    return special == 0 ? n : n - 8 + firstIn(special);
+  }
+  if (n >= 4) {
+    std::uint32_t first;
+    std::uint32_t last;
+    std::memcpy(&first, p, sizeof first);
+    std::memcpy(&last, p + n - 4, sizeof last);
+    const std::uint64_t special = specialBytes(first | (std::uint64_t{last} << 32));
+    if (special == 0) return n;
+    const std::size_t at = firstIn(special);
+    return at < 4 ? at : n - 8 + at;
+  }
+  std::size_t i = 0;
+  while (i < n && kPlainBytes[static_cast<unsigned char>(p[i])]) ++i;
+  return i;
+}
+
 }  // namespace
 
 void JsonTextWriter::grow(std::size_t n) {
@@ -343,8 +388,7 @@ void JsonTextWriter::grow(std::size_t n) {
 void JsonTextWriter::string(std::string_view text) {
   // Most texts are plain ASCII: copied in one step. Of the others, the plain start is not looked
   // at again. Room is made for the worst case of the rest: every byte written as \u00XX.
-  const auto special = std::find_if(text.begin(), text.end(), [](char c) { return !kPlainBytes[static_cast<unsigned char>(c)]; });
-  const auto plain = static_cast<std::size_t>(special - text.begin());
+  const std::size_t plain = plainPrefix(text);
   char* const start = room(plain + 6 * (text.size() - plain) + 2);
   char* p = start;
   *p++ = '"';
