@@ -8,6 +8,8 @@
 
 #include <array>
 #include <bit>
+#include <cstdint>
+#include <cstring>
 #include <functional>
 #include <type_traits>
 #include <utility>
@@ -19,9 +21,41 @@ using platform::services;
 
 namespace {
 
+/// A hash of a handle (an e-mail address or a phone number: short), eight bytes at a time without a
+/// call; the last bytes are read as a word that overlaps the ones before.
+std::size_t handleHash(std::string_view handle) noexcept {
+  const char* const p = handle.data();
+  const std::size_t n = handle.size();
+  std::uint64_t h = n * 0x9E3779B97F4A7C15u;
+  const auto mix = [&h](std::uint64_t word) {
+    h = (h ^ word) * 0xBF58476D1CE4E5B9u;
+    h ^= h >> 31;
+  };
+  if (n >= 8) {
+    std::uint64_t word;
+    for (std::size_t i = 0; i + 8 < n; i += 8) {
+      std::memcpy(&word, p + i, sizeof word);
+      mix(word);
+    }
+    std::memcpy(&word, p + n - 8, sizeof word);
+    mix(word);
+  } else if (n >= 4) {
+    std::uint32_t first;
+    std::uint32_t last;
+    std::memcpy(&first, p, sizeof first);
+    std::memcpy(&last, p + n - 4, sizeof last);
+    mix(first | (std::uint64_t{last} << 32));
+  } else if (n > 0) {
+    mix(static_cast<unsigned char>(p[0]) | (static_cast<std::uint64_t>(static_cast<unsigned char>(p[n / 2])) << 8) |
+        (static_cast<std::uint64_t>(static_cast<unsigned char>(p[n - 1])) << 16));
+  }
+  h *= 0x94D049BB133111EBu;
+  return static_cast<std::size_t>(h ^ (h >> 32));
+}
+
 /// Values by handle in one array (open addressing), without a node per handle: a search looks up
-/// every friend's handle twice. Made for a number of handles; at least half its slots stay free,
-/// so that every look-up ends.
+/// every friend's handle twice, with one hash (`handleHash`). Made for a number of handles; at
+/// least half its slots stay free, so that every look-up ends.
 template <class V>
 class HandleIndex {
  public:
@@ -29,16 +63,16 @@ class HandleIndex {
 
   /// The value of `handle`, made when new; and whether it was. Null when the index is full.
   std::pair<V*, bool> insert(std::string_view handle) {
-    Slot& slot = slots_[place(handle)];
+    Slot& slot = slots_[place(handle, handleHash(handle))];
     if (slot.used) return {&slot.value, false};
     if (2 * (used_ + 1) > slots_.size()) return {nullptr, false};
     slot = Slot{handle, V{}, true};
     ++used_;
     return {&slot.value, true};
   }
-  /// The value of `handle`, or null.
-  [[nodiscard]] const V* find(std::string_view handle) const {
-    const Slot& slot = slots_[place(handle)];
+  /// The value of `handle`, whose hash is `hash`, or null.
+  [[nodiscard]] const V* find(std::string_view handle, std::size_t hash) const {
+    const Slot& slot = slots_[place(handle, hash)];
     return slot.used ? &slot.value : nullptr;
   }
 
@@ -49,9 +83,9 @@ class HandleIndex {
     bool used = false;
   };
   /// The slot that holds `handle`, else the free one where it goes.
-  [[nodiscard]] std::size_t place(std::string_view handle) const {
+  [[nodiscard]] std::size_t place(std::string_view handle, std::size_t hash) const {
     const std::size_t mask = slots_.size() - 1;
-    for (std::size_t i = std::hash<std::string_view>{}(handle) & mask;; i = (i + 1) & mask) {
+    for (std::size_t i = hash & mask;; i = (i + 1) & mask) {
       if (!slots_[i].used || slots_[i].handle == handle) return i;
     }
   }
@@ -206,13 +240,14 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
 
   found.reserve(handlesToReport.isArray() ? handlesToReport.size() : entryOrder.size());
   auto visit = [&](std::string_view handle) {
-    const platform::JsonView* entryFound = entries.find(handle);
+    const std::size_t hash = handleHash(handle);
+    const platform::JsonView* entryFound = entries.find(handle, hash);
     const platform::JsonView entry = entryFound ? *entryFound : platform::JsonView();
     static constexpr std::array<std::string_view, 2> kKeys{"status", "match"};
     std::array<platform::JsonView, kKeys.size()> read;
     entry.members(kKeys, read);
     if (platform::integerValue(read[0]) == 411) return;  // not a friend: left out
-    const auto* const* holder = personForHandle.find(handle);
+    const auto* const* holder = personForHandle.find(handle, hash);
     KYNAXLocation record(std::string(handle), holder ? **holder : nullptr, entry);
     if (record.avixLocation) found.push_back(std::move(record.avixLocation));
     atRequestedLocation = platform::boolValue(read[1]).value_or(false);
