@@ -377,12 +377,17 @@ std::size_t plainPrefix(std::string_view text) noexcept {
 }  // namespace
 
 void JsonTextWriter::grow(std::size_t n) {
-  // Up to the capacity the string has, else by what appending would have grown it; each byte is
-  // cleared once, then written.
-  constexpr std::size_t kStep = 4096;
   const std::size_t needed = at_ + n;
   const std::size_t capacity = out_.capacity();
-  out_.resize(needed > capacity ? std::max(needed, 2 * capacity) : std::max(needed, std::min(capacity, at_ + kStep)));
+  if (needed > capacity) {
+    out_.resize(std::max(needed, 2 * capacity));  // as appending would have grown it
+    return;
+  }
+  // Within the capacity: room for as much again as was written (at least 256 bytes), so that the
+  // bytes cleared ahead stay in proportion to those written, and a short text clears little of a
+  // large reserve.
+  constexpr std::size_t kLeast = 256;
+  out_.resize(std::min(capacity, std::max(needed, at_ + std::max(at_, kLeast))));
 }
 
 void JsonTextWriter::string(std::string_view text) {
