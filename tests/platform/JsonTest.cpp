@@ -80,13 +80,20 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
   EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
   // Texts are scanned a word at a time: every byte that needs care, at every place of texts up to
-  // three words long, is written as the library writes it.
+  // three words long, alone and before another one, is written as the library writes it.
+  const auto asLibrary = [](const std::string& sample) { return Value(sample).dump(-1, ' ', false, Value::error_handler_t::replace); };
   for (std::size_t size = 1; size <= 24; ++size) {
     for (std::size_t at = 0; at < size; ++at) {
       for (const char special : {'\x00', '\x1F', '"', '\\', '\x7F', '\x80', '\xFF', ' '}) {
         std::string sample(size, '~');
         sample[at] = special;
-        ASSERT_EQ(written(sample), Value(sample).dump(-1, ' ', false, Value::error_handler_t::replace)) << size << " " << at;
+        ASSERT_EQ(written(sample), asLibrary(sample)) << size << " " << at;
+      }
+      for (std::size_t later = at + 1; later < size; ++later) {
+        std::string sample(size, '~');
+        sample[at] = '"';
+        sample[later] = '\x01';
+        ASSERT_EQ(written(sample), asLibrary(sample)) << size << " " << at << " " << later;
       }
     }
   }
@@ -161,6 +168,7 @@ TEST(Json, OutsideCorpus) {
     std::string roomy = text;
     const auto inPlace = parseJsonDocumentInPlace(roomy);
     EXPECT_EQ(roomy, text) << name;
+    EXPECT_GE(roomy.capacity(), roomy.size() + 64) << name;  // the room the reader reads into
     ++files;
     if (name.starts_with("y_")) {
       EXPECT_TRUE(parsed) << name;

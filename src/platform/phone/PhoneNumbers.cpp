@@ -47,7 +47,7 @@ class ResultCache {
     }
     const std::size_t at = place(key, hash);
     hashes_[at] = hash;
-    entries_[at] = Entry{std::move(key), std::move(result), false};
+    entries_[at] = Entry{std::move(key), std::move(result), true};  // new: not the next to go
     ++count_;
   }
 
