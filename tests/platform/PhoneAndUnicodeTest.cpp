@@ -1,7 +1,11 @@
 #include "platform/phone/PhoneNumbers.h"
+#include "platform/phone/ResultCache.h"
 #include "platform/text/Unicode.h"
 
 #include <gtest/gtest.h>
+
+#include <algorithm>
+#include <string>
 
 namespace kyn::platform {
 namespace {
@@ -21,6 +25,30 @@ TEST(PhoneNumbers, NumbersThatLeftTheCacheOfRecentResultsAreReadAfresh) {
   for (int i = 0; i < 8200; ++i) (void)formatPhoneNumber(number(i), "", PhoneNumberStyle::Canonical);
   for (int i = 0; i < 3; ++i) {
     EXPECT_EQ(formatPhoneNumber(number(i), "", PhoneNumberStyle::Canonical), "+1503555000" + std::to_string(i));
+  }
+}
+
+TEST(PhoneNumbers, TheResultsCacheFindsWhatItHoldsThroughCollisionsAndEvictions) {
+  // Keys hash to two neighbouring slots by their last digit, near the start or at the last slot and
+  // the first (their run wraps round), so that what goes leaves gaps inside runs: each result kept
+  // is found, with its own value, as results come and go.
+  struct TwoSlots {
+    std::size_t slot;
+    std::size_t operator()(std::string_view key) const { return slot + static_cast<std::size_t>(key.back() % 2); }
+  };
+  for (const std::size_t slot : {5u, 63u}) {
+    ResultCache<4, TwoSlots> cache(TwoSlots{slot});
+    for (int i = 0; i < 12; ++i) {
+      cache.insert(std::to_string(i), "r" + std::to_string(i));
+      int held = 0;
+      for (int k = 0; k <= i; ++k) {
+        if (const auto found = cache.find(std::to_string(k))) {
+          ++held;
+          EXPECT_EQ(*found, "r" + std::to_string(k));
+        }
+      }
+      EXPECT_EQ(held, std::min(i + 1, 4)) << slot << " " << i;
+    }
   }
 }
 
