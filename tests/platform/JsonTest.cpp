@@ -75,7 +75,11 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   EXPECT_EQ(text, v.dump(-1, ' ', /*ensure_ascii=*/false, Value::error_handler_t::replace));
   EXPECT_NE(text.find("\xEF\xBF\xBD"), std::string::npos);
   EXPECT_TRUE(parseJson(text));
-  const auto written = [](std::string_view input) { std::string out; appendJsonString(out, input); return out; };
+  const auto written = [](std::string_view input) {
+    std::string out;
+    JsonTextWriter(out).string(input);
+    return out;
+  };
   EXPECT_EQ(written("a\x01" "b\x1F"), R"("a\u0001b\u001f")");  // 0x1F: the last control character
   EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
   EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
@@ -110,7 +114,7 @@ TEST(Json, ANumberIsWrittenAsTheLibraryWritesItOrShorterForTheSameDouble) {
   for (const double value : values) {
     if (!std::isfinite(value)) continue;
     std::string out;
-    appendJsonNumber(out, value);
+    JsonTextWriter(out).number(value);
     const std::string library = Value(value).dump();
     if (out == library) continue;
     const auto read = parseJson(out);

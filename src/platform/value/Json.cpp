@@ -436,8 +436,6 @@ void JsonTextWriter::string(std::string_view text) {
   at_ += static_cast<std::size_t>(p - start);
 }
 
-void appendJsonString(std::string& out, std::string_view text) { JsonTextWriter(out).string(text); }
-
 namespace {
 
 /// "00" to "99".
@@ -520,10 +518,6 @@ void JsonTextWriter::number(std::uint64_t value) {
   char* const start = room(kMost);
   at_ += static_cast<std::size_t>(std::to_chars(start, start + kMost, value).ptr - start);
 }
-
-void appendJsonNumber(std::string& out, double value) { JsonTextWriter(out).number(value); }
-
-void appendJsonNumber(std::string& out, std::int64_t value) { JsonTextWriter(out).number(value); }
 
 struct JsonDocument::Storage {
   Document document;  // what simdjson read

@@ -65,14 +65,12 @@ class JsonDocument {
 /// building did. Recursion is as deep as the value (parsed values are bounded by JsonLimits).
 void releaseValue(Value& value) noexcept;
 
-// Pieces of JSON text for writers that do without a Value: each appends what `toJson` writes for
-// the same string or number, except that a number is sometimes written in fewer digits than the
-// library's (which are not always the fewest), for the same double.
-
-/// Writes JSON text at the end of a string through a cursor. Room is made ahead in steps, so that
-/// a piece costs a comparison and a copy rather than a string append; when the writer goes, the
-/// string is cut back to what was written. Meant for one text written piece by piece: a writer
-/// per piece would make room each time.
+/// Writes JSON text at the end of a string through a cursor, for writers that do without a Value:
+/// each piece is what `toJson` writes for the same string or number, except that a number is
+/// sometimes written in fewer digits than the library's (which are not always the fewest), for the
+/// same double. Room is made ahead in steps, so that a piece costs a comparison and a copy rather
+/// than a string append; when the writer goes, the string is cut back to what was written. Meant
+/// for one text written piece by piece: a writer per piece would make room each time.
 class JsonTextWriter {
  public:
   explicit JsonTextWriter(std::string& out) noexcept : out_(out), at_(out.size()) {}
@@ -108,11 +106,5 @@ class JsonTextWriter {
   std::string& out_;
   std::size_t at_;  // the end of what was written; the string's bytes after it are room
 };
-
-/// A string, quoted and escaped; invalid UTF-8 replaced by U+FFFD.
-void appendJsonString(std::string& out, std::string_view text);
-/// A number; "null" for NaN and infinity.
-void appendJsonNumber(std::string& out, double value);
-void appendJsonNumber(std::string& out, std::int64_t value);
 
 }  // namespace kyn::platform
