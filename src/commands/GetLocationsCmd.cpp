@@ -3,13 +3,13 @@
 #include "account/Common.h"
 #include "model/KYNAXLocation.h"
 #include "platform/Services.h"
+#include "platform/text/Words.h"
 #include "platform/value/Json.h"
 #include "utils/KYNAXUtils.h"
 
 #include <array>
 #include <bit>
 #include <cstdint>
-#include <cstring>
 #include <functional>
 #include <type_traits>
 #include <utility>
@@ -21,8 +21,7 @@ using platform::services;
 
 namespace {
 
-/// A hash of a handle (an e-mail address or a phone number: short), eight bytes at a time without a
-/// call; the last bytes are read as a word that overlaps the ones before.
+/// A hash of a handle (an e-mail address or a phone number: short), a word at a time.
 std::size_t handleHash(std::string_view handle) noexcept {
   const char* const p = handle.data();
   const std::size_t n = handle.size();
@@ -32,19 +31,10 @@ std::size_t handleHash(std::string_view handle) noexcept {
     h ^= h >> 31;
   };
   if (n >= 8) {
-    std::uint64_t word;
-    for (std::size_t i = 0; i + 8 < n; i += 8) {
-      std::memcpy(&word, p + i, sizeof word);
-      mix(word);
-    }
-    std::memcpy(&word, p + n - 8, sizeof word);
-    mix(word);
+    for (std::size_t i = 0; i + 8 < n; i += 8) mix(platform::word8At(p + i));
+    mix(platform::word8At(p + n - 8));
   } else if (n >= 4) {
-    std::uint32_t first;
-    std::uint32_t last;
-    std::memcpy(&first, p, sizeof first);
-    std::memcpy(&last, p + n - 4, sizeof last);
-    mix(first | (std::uint64_t{last} << 32));
+    mix(platform::shortTextWord(p, n));
   } else if (n > 0) {
     mix(static_cast<unsigned char>(p[0]) | (static_cast<std::uint64_t>(static_cast<unsigned char>(p[n / 2])) << 8) |
         (static_cast<std::uint64_t>(static_cast<unsigned char>(p[n - 1])) << 16));

@@ -3,6 +3,7 @@
 #include "platform/text/ByteClass.h"
 #include "platform/text/SameText.h"
 #include "platform/text/StringEscapes.h"
+#include "platform/text/Words.h"
 
 #include <simdjson.h>
 
@@ -350,21 +351,14 @@ std::size_t plainPrefix(std::string_view text) noexcept {
   const std::size_t n = text.size();
   const auto firstIn = [](std::uint64_t special) { return static_cast<std::size_t>(std::countr_zero(special)) / 8; };
   if (n >= 8) {
-    std::uint64_t word;
     for (std::size_t i = 0; i + 8 < n; i += 8) {
-      std::memcpy(&word, p + i, sizeof word);
-      if (const std::uint64_t special = specialBytes(word); special != 0) return i + firstIn(special);
+      if (const std::uint64_t special = specialBytes(word8At(p + i)); special != 0) return i + firstIn(special);
     }
-    std::memcpy(&word, p + n - 8, sizeof word);
-    const std::uint64_t special = specialBytes(word);
+    const std::uint64_t special = specialBytes(word8At(p + n - 8));
     return special == 0 ? n : n - 8 + firstIn(special);
   }
   if (n >= 4) {
-    std::uint32_t first;
-    std::uint32_t last;
-    std::memcpy(&first, p, sizeof first);
-    std::memcpy(&last, p + n - 4, sizeof last);
-    const std::uint64_t special = specialBytes(first | (std::uint64_t{last} << 32));
+    const std::uint64_t special = specialBytes(shortTextWord(p, n));
     if (special == 0) return n;
     const std::size_t at = firstIn(special);
     return at < 4 ? at : n - 8 + at;
