@@ -391,7 +391,7 @@ void JsonTextWriter::string(std::string_view text) {
   char* const start = room(plain + 6 * (text.size() - plain) + 2);
   char* p = start;
   *p++ = '"';
-  std::char_traits<char>::copy(p, text.data(), plain);
+  copyBytes(p, text.data(), plain);
   p += plain;
   bool checked = false;  // the whole text has been found to be valid UTF-8
   for (std::size_t i = plain; i < text.size(); ++i) {

@@ -1,5 +1,6 @@
 #pragma once
 
+#include "platform/text/Words.h"
 #include "platform/value/Value.h"
 
 #include <cstddef>
@@ -84,7 +85,7 @@ class JsonTextWriter {
     return *this;
   }
   JsonTextWriter& operator+=(std::string_view text) {
-    std::char_traits<char>::copy(room(text.size()), text.data(), text.size());
+    copyBytes(room(text.size()), text.data(), text.size());
     at_ += text.size();
     return *this;
   }
