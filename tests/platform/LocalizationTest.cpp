@@ -54,6 +54,9 @@ TEST(NumberFormatting, DecimalsAreReadAsTheLocaleWritesThem) {
   IcuNumberFormatting en("en_US");
   IcuNumberFormatting de("de_DE");
   EXPECT_EQ(en.parseDecimal("1234.5"), 1234.5);
+  // Fifteen digits, the most read without ICU, round as the compiler rounds the same literals.
+  EXPECT_EQ(en.parseDecimal("0.123456789012345"), 0.123456789012345);
+  EXPECT_EQ(en.parseDecimal("98765432109876.5"), 98765432109876.5);
   EXPECT_EQ(en.parseDecimal("12345678901234567890"), 12345678901234567890.0);  // too long for the fast path
   EXPECT_EQ(en.parseDecimal("1,234.5"), 1234.5);
   EXPECT_EQ(de.parseDecimal("1234,5"), 1234.5);

@@ -9,8 +9,9 @@
 #include <unicode/unistr.h>
 #include <unicode/ures.h>
 
-#include <charconv>
+#include <array>
 #include <cstddef>
+#include <cstdint>
 #include <cstring>
 #include <new>
 #include <mutex>
@@ -91,30 +92,30 @@ struct IcuNumberFormatting::Impl {
   char asciiSeparator = 0;
 
   /// The value of a text of ASCII digits with at most one separator between digits, read without
-  /// ICU; nothing for any other text. Fifteen digits at most, so that the value is the correctly
-  /// rounded double that ICU's reading gives too.
+  /// ICU; nothing for any other text. Fifteen digits at most: the digits then make an integer that
+  /// a double holds exactly, as it holds every power of ten up to 10^15, so one division gives the
+  /// correctly rounded value, the one ICU's reading gives too.
   [[nodiscard]] std::optional<double> plainDecimal(std::string_view text) const {
+    static constexpr std::array<double, 16> kPowersOfTen{1e0, 1e1, 1e2,  1e3,  1e4,  1e5,  1e6,  1e7,
+                                                         1e8, 1e9, 1e10, 1e11, 1e12, 1e13, 1e14, 1e15};
     if (asciiSeparator == 0 || text.empty() || text.size() > 16) return std::nullopt;
-    char buffer[17];
+    std::uint64_t mantissa = 0;
     std::size_t digits = 0;
     std::size_t separator = std::string_view::npos;
     for (std::size_t i = 0; i < text.size(); ++i) {
       const char c = text[i];
       if (c >= '0' && c <= '9') {
-        buffer[i] = c;
+        mantissa = mantissa * 10 + static_cast<unsigned>(c - '0');
         ++digits;
       } else if (c == asciiSeparator && separator == std::string_view::npos && i > 0 && i + 1 < text.size()) {
-        buffer[i] = '.';
         separator = i;
       } else {
         return std::nullopt;
       }
     }
     if (digits > 15) return std::nullopt;
-    double value = 0;
-    const auto [end, error] = std::from_chars(buffer, buffer + text.size(), value);
-    if (error != std::errc() || end != buffer + text.size()) return std::nullopt;
-    return value;
+    const std::size_t fraction = separator == std::string_view::npos ? 0 : text.size() - separator - 1;
+    return static_cast<double>(mantissa) / kPowersOfTen[fraction];
   }
 };
 
