@@ -233,12 +233,15 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
     const std::size_t hash = handleHash(handle);
     const platform::JsonView* entryFound = entries.find(handle, hash);
     const platform::JsonView entry = entryFound ? *entryFound : platform::JsonView();
-    static constexpr std::array<std::string_view, 2> kKeys{"status", "match"};
+    // The entry's own members and those that the record decodes, in one walk over it.
+    static constexpr std::array<std::string_view, 4> kKeys{"status", "match", KYNAXLocation::kEntryKeys[0],
+                                                           KYNAXLocation::kEntryKeys[1]};
     std::array<platform::JsonView, kKeys.size()> read;
     entry.members(kKeys, read);
     if (platform::integerValue(read[0]) == 411) return;  // not a friend: left out
     const auto* const* holder = personForHandle.find(handle, hash);
-    KYNAXLocation record(std::string(handle), holder ? **holder : nullptr, entry);
+    KYNAXLocation record(std::string(handle), holder ? **holder : nullptr,
+                         std::span<const platform::JsonView, 2>(read.data() + 2, 2));
     if (record.avixLocation) found.push_back(std::move(record.avixLocation));
     atRequestedLocation = platform::boolValue(read[1]).value_or(false);
   };

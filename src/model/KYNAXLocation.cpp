@@ -26,6 +26,11 @@ KYNAXLocation::KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<
   decodeHandle(std::move(handle), std::move(person), entry);
 }
 
+KYNAXLocation::KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
+                             std::span<const platform::JsonView, kEntryKeys.size()> entryMembers) {
+  decodeHandle(std::move(handle), std::move(person), entryMembers);
+}
+
 KYNAXLocation::KYNAXLocation(std::shared_ptr<AXKynLocation> location) : avixLocation(std::move(location)) {}
 
 std::shared_ptr<KYNAXLocation> KYNAXLocation::locationWithHandle(const std::optional<std::string>& handle,
@@ -45,6 +50,13 @@ std::shared_ptr<platform::Localization> KYNAXLocation::bundle() { return service
 
 void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
                                  platform::JsonView entry) {
+  std::array<platform::JsonView, kEntryKeys.size()> entryMembers;
+  entry.members(kEntryKeys, entryMembers);
+  decodeHandle(std::move(handle), std::move(person), entryMembers);
+}
+
+void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
+                                 std::span<const platform::JsonView, kEntryKeys.size()> entryMembers) {
   auto location = std::make_shared<AXKynLocation>();
   avixLocation = location;
 
@@ -60,10 +72,7 @@ void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_
   location->friend_ = attribute;
 
   // Each object's members are read in one walk over it.
-  static constexpr std::array<std::string_view, 2> entryKeys{"distanceInMeters", "location"};
-  std::array<platform::JsonView, entryKeys.size()> entryRead;
-  entry.members(entryKeys, entryRead);
-  if (const platform::JsonView distance = entryRead[0]) {
+  if (const platform::JsonView distance = entryMembers[0]) {
     // The server sends the distance as text; it is read as the user's locale writes numbers.
     // A value that is no text reads as no distance.
     const auto written = distance.string();
@@ -71,7 +80,7 @@ void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_
   }
 
   // A location that is no JSON object (null included) is absent.
-  const platform::JsonView fix = entryRead[1].isObject() ? entryRead[1] : platform::JsonView();
+  const platform::JsonView fix = entryMembers[1].isObject() ? entryMembers[1] : platform::JsonView();
   enum { kAddress, kLatitude, kLongitude, kAccuracy, kTimestamp, kStreet, kLabels, kFixKeys };
   static constexpr std::array<std::string_view, kFixKeys> fixKeys{
       "address", "latitude", "longitude", "horizontalAccuracy", "timestamp", "streetAddress", "labels"};

@@ -8,9 +8,12 @@
 #include "platform/location/Location.h"
 #include "platform/value/Value.h"
 
+#include <array>
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
+#include <string_view>
 
 namespace kyn {
 
@@ -21,6 +24,13 @@ class KYNAXLocation : public KYNAXBaseModel {
   /// Decodes `entry` (a friend location entry, or nothing) for `handle`; without a person, one is
   /// built from the contacts.
   KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
+  /// The members of a friend location entry that decoding reads, in the order in which the
+  /// constructor below takes their values: for a caller that reads other members of the entry in
+  /// the same walk over it.
+  static constexpr std::array<std::string_view, 2> kEntryKeys{"distanceInMeters", "location"};
+  /// Decodes an entry from its members named by `kEntryKeys`, found by the caller.
+  KYNAXLocation(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
+                std::span<const platform::JsonView, kEntryKeys.size()> entryMembers);
   /// Wraps an assistant location as it is: nothing decoded, no person looked up.
   explicit KYNAXLocation(std::shared_ptr<AXKynLocation> avixLocation);
   ~KYNAXLocation() override = default;
@@ -32,6 +42,9 @@ class KYNAXLocation : public KYNAXBaseModel {
 
   /// Replaces `avixLocation` with one decoded from `entry`. Values of the wrong type read as absent.
   void decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person, platform::JsonView entry);
+  /// The same from the entry's members named by `kEntryKeys`.
+  void decodeHandle(std::optional<std::string> handle, std::shared_ptr<AXPerson> person,
+                    std::span<const platform::JsonView, kEntryKeys.size()> entryMembers);
 
   /// Latitude and longitude are both present (zero counts as present).
   [[nodiscard]] bool hasCoordinate() const;
