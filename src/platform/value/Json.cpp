@@ -479,10 +479,12 @@ char* writeShortDecimal(char* out, double value) noexcept {
   const bool small = magnitude < 16777216.0;
   if (magnitude < 1e-4 || magnitude >= 2147483648.0) return nullptr;
   const double scale = small ? 1e8 : 1e6;
-  const double scaled = std::round(magnitude * scale);
-  if (scaled / scale != magnitude) return nullptr;
+  // Rounded to the nearest integer by adding a half and truncating, without a library call. The
+  // sum is exact unless the product lies half an integer away from one, and such a value is no
+  // short decimal: the check below turns it away whichever way it rounds.
+  const auto digits = static_cast<std::uint64_t>(magnitude * scale + 0.5);
+  if (static_cast<double>(digits) / scale != magnitude) return nullptr;
   if (value < 0) *out++ = '-';
-  const auto digits = static_cast<std::uint64_t>(scaled);
   return small ? writeScaled<8>(out, digits) : writeScaled<6>(out, digits);
 }
 
