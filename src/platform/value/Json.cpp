@@ -377,11 +377,12 @@ void JsonTextWriter::grow(std::size_t n) {
     out_.resize(std::max(needed, 2 * capacity));  // as appending would have grown it
     return;
   }
-  // Within the capacity: room for as much again as was written (at least 256 bytes), so that the
-  // bytes cleared ahead stay in proportion to those written, and a short text clears little of a
-  // large reserve.
+  // Within the capacity: room for as much again as this writer has written (at least 256 bytes),
+  // so that the bytes cleared ahead stay in proportion to those written. A short text clears little
+  // of a large reserve, and a record written at the end of a long text (a log line that describes
+  // many) does not clear room for the whole text again.
   constexpr std::size_t kLeast = 256;
-  out_.resize(std::min(capacity, std::max(needed, at_ + std::max(at_, kLeast))));
+  out_.resize(std::min(capacity, std::max(needed, at_ + std::max(at_ - start_, kLeast))));
 }
 
 void JsonTextWriter::string(std::string_view text) {

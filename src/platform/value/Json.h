@@ -74,7 +74,7 @@ void releaseValue(Value& value) noexcept;
 /// for one text written piece by piece: a writer per piece would make room each time.
 class JsonTextWriter {
  public:
-  explicit JsonTextWriter(std::string& out) noexcept : out_(out), at_(out.size()) {}
+  explicit JsonTextWriter(std::string& out) noexcept : out_(out), start_(out.size()), at_(start_) {}
   ~JsonTextWriter() { out_.resize(at_); }
   JsonTextWriter(const JsonTextWriter&) = delete;
   JsonTextWriter& operator=(const JsonTextWriter&) = delete;
@@ -105,7 +105,8 @@ class JsonTextWriter {
   void grow(std::size_t n);
 
   std::string& out_;
-  std::size_t at_;  // the end of what was written; the string's bytes after it are room
+  std::size_t start_;  // where this writer began: the string may hold a long text before it
+  std::size_t at_;     // the end of what was written; the string's bytes after it are room
 };
 
 }  // namespace kyn::platform
