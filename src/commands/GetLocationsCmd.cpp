@@ -11,6 +11,7 @@
 #include <bit>
 #include <cstdint>
 #include <functional>
+#include <span>
 #include <type_traits>
 #include <utility>
 #include <vector>
@@ -241,7 +242,7 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
     if (platform::integerValue(read[0]) == 411) return;  // not a friend: left out
     const auto* const* holder = personForHandle.find(handle, hash);
     KYNAXLocation record(std::string(handle), holder ? **holder : nullptr,
-                         std::span<const platform::JsonView, 2>(read.data() + 2, 2));
+                         std::span(read).last<KYNAXLocation::kEntryKeys.size()>());
     if (record.avixLocation) found.push_back(std::move(record.avixLocation));
     atRequestedLocation = platform::boolValue(read[1]).value_or(false);
   };
