@@ -175,6 +175,7 @@ std::string GetLocationsCmd::jsonBody() const {
 
 AXArray<AXKynLocation> GetLocationsCmd::result() {
   auto& log = services().log();
+  resultDescription_.reset();
   const platform::JsonView response = jsonResponse();
   log.notice("getlocations_resultDictionary_raw: %@", response);
 
@@ -255,7 +256,10 @@ AXArray<AXKynLocation> GetLocationsCmd::result() {
     for (const std::string_view handle : entryOrder) visit(handle);
   }
 
-  log.notice("location result: %@", found);
+  if (log.isEnabled(platform::LogLevel::Default)) {
+    resultDescription_ = platform::FormatArg::describeArray(found);
+    log.notice("location result: %@", *resultDescription_);
+  }
   return found;
 }
 

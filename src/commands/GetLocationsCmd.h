@@ -8,6 +8,7 @@
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 namespace kyn {
@@ -28,6 +29,10 @@ class GetLocationsCmd : public KYNBaseCmd {
   /// `atRequestedLocation` (the "match" of the last entry not skipped) and `contextIdentifierURL`.
   /// Work is linear in the number of entries.
   [[nodiscard]] AXArray<AXKynLocation> result();
+  /// The text in which the last `result()` logged the locations it returned, when it made that log
+  /// line; taken out. The caller that logs the same records next takes it rather than describing
+  /// them again, which is the larger part of what a search's log lines cost.
+  [[nodiscard]] std::optional<std::string> takeResultDescription() noexcept { return std::exchange(resultDescription_, {}); }
 
   /// Every friend's handles, friend after friend (phones, then e-mails); nothing without friends.
   [[nodiscard]] std::optional<std::vector<std::string>> allFriendsHandles() const;
@@ -52,6 +57,8 @@ class GetLocationsCmd : public KYNBaseCmd {
   /// Hands each member that follows the base's to `sink(key, value)`, in order.
   template <class Sink>
   void bodyMembers(Sink&& sink) const;
+
+  std::optional<std::string> resultDescription_;
 };
 
 }  // namespace kyn

@@ -46,7 +46,9 @@ std::shared_ptr<AXObject> searchReply(GetLocationsCmd& command) {
   auto& log = services().log();
   // Reading the result parses the response and so fills the status code: it comes first.
   auto locations = command.result();
-  log.notice("Result: %@", locations);
+  // The same records that result() has just logged: the same text, made once.
+  if (auto described = command.takeResultDescription(); described && locations) log.notice("Result: %@", *described);
+  else log.notice("Result: %@", locations);
   if (command.wasSuccessful()) {
     const std::int32_t status = platform::int32Value(command.statusCodeValue());
     if (status == 417) return AXCommandFailed::commandFailedWithErrorCode(AXKynNoFriendsErrorCode);

@@ -54,16 +54,9 @@ class FormatArg {
   void appendText(std::string& out) const;
   /// About how long the text is, to make room for it.
   [[nodiscard]] std::size_t sizeHint() const noexcept;
-  /// The value for `%d`, `%ld`, `%li`, `%u`: an integer, a double truncated, a text by its leading integer.
-  [[nodiscard]] std::int64_t integer() const;
-  /// The value for `%f`.
-  [[nodiscard]] double floating() const;
-
- private:
-  using Variant = std::variant<std::string, std::int64_t, double>;
-
+  /// The text of `%@` for an array of objects: "(", their descriptions joined by ", ", ")".
   template <class T>
-  static std::string describeArray(const std::vector<std::shared_ptr<T>>& objects) {
+  [[nodiscard]] static std::string describeArray(const std::vector<std::shared_ptr<T>>& objects) {
     std::string out = "(";
     for (std::size_t i = 0; i < objects.size(); ++i) {
       if (i) out += ", ";
@@ -73,6 +66,13 @@ class FormatArg {
     out += ")";
     return out;
   }
+  /// The value for `%d`, `%ld`, `%li`, `%u`: an integer, a double truncated, a text by its leading integer.
+  [[nodiscard]] std::int64_t integer() const;
+  /// The value for `%f`.
+  [[nodiscard]] double floating() const;
+
+ private:
+  using Variant = std::variant<std::string, std::int64_t, double>;
 
   Variant v_;
 };
