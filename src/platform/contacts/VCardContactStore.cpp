@@ -16,7 +16,9 @@
 #include <array>
 #include <cerrno>
 #include <cstring>
+#include <functional>
 #include <mutex>
+#include <string_view>
 #include <unordered_map>
 #include <unordered_set>
 
@@ -27,7 +29,14 @@ namespace fs = std::filesystem;
 
 constexpr std::uint64_t kMaxFileBytes = std::uint64_t{64} << 20;
 
-using ContactIndex = std::unordered_map<std::string, std::vector<std::uint32_t>>;
+/// Hashes index keys as views, so that a look-up needs no string of its own.
+struct KeyHash {
+  using is_transparent = void;
+  std::size_t operator()(std::string_view key) const noexcept { return std::hash<std::string_view>{}(key); }
+};
+template <class Value>
+using KeyedBy = std::unordered_map<std::string, Value, KeyHash, std::equal_to<>>;
+using ContactIndex = KeyedBy<std::vector<std::uint32_t>>;
 
 std::string_view trim(std::string_view text) {
   constexpr std::string_view kSpace = " \t\r\n";
@@ -36,18 +45,33 @@ std::string_view trim(std::string_view text) {
   return text.substr(first, text.find_last_not_of(kSpace) - first + 1);
 }
 
-// E-mail addresses compare ignoring case; ASCII (nearly all of them) folds without ICU.
-std::string emailKey(std::string_view address) {
-  address = trim(address);
-  if (std::all_of(address.begin(), address.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; })) {
-    std::string key(address);
-    for (char& c : key) {
-      if (c >= 'A' && c <= 'Z') c = static_cast<char>(c - 'A' + 'a');
+// E-mail addresses compare ignoring case; ASCII (nearly all of them) folds without ICU, on the
+// stack when the address is no longer than an address may be.
+class EmailKey {
+ public:
+  explicit EmailKey(std::string_view address) {
+    address = trim(address);
+    if (address.size() <= buffer_.size() &&
+        std::all_of(address.begin(), address.end(), [](char c) { return static_cast<unsigned char>(c) < 0x80; })) {
+      std::transform(address.begin(), address.end(), buffer_.begin(),
+                     [](char c) { return c >= 'A' && c <= 'Z' ? static_cast<char>(c - 'A' + 'a') : c; });
+      key_ = std::string_view(buffer_.data(), address.size());
+    } else {
+      folded_ = foldCase(address);
+      key_ = folded_;
     }
-    return key;
   }
-  return foldCase(address);
-}
+  EmailKey(const EmailKey&) = delete;
+  EmailKey& operator=(const EmailKey&) = delete;
+  [[nodiscard]] std::string_view view() const noexcept { return key_; }
+
+ private:
+  std::array<char, 254> buffer_;  // the longest address that a mail system takes
+  std::string folded_;
+  std::string_view key_;
+};
+
+std::string emailKey(std::string_view address) { return std::string(EmailKey(address).view()); }
 
 // A number in its canonical form; a text that is no phone number ("BusinessPhone") stands for itself.
 std::string phoneKey(std::string_view number, const std::string& region) {
@@ -195,7 +219,7 @@ struct VCardContactStore::Impl {
   std::once_flag loadOnce;
   std::vector<std::shared_ptr<const Contact>> contacts;  // in book order, unified
   ContactIndex byEmail;
-  std::unordered_map<std::string, std::uint32_t> byIdentifier;
+  KeyedBy<std::uint32_t> byIdentifier;
 
   // Reading numbers is most of the cost of indexing, so the phone index waits for its first use.
   std::once_flag phoneIndexOnce;
@@ -319,7 +343,7 @@ struct VCardContactStore::Impl {
     }
   }
 
-  std::vector<std::shared_ptr<const Contact>> project(const ContactIndex& index, const std::string& key,
+  std::vector<std::shared_ptr<const Contact>> project(const ContactIndex& index, std::string_view key,
                                                       const ContactKeys& keys, std::string* error) {
     std::vector<std::shared_ptr<const Contact>> out;
     const auto it = index.find(key);
@@ -349,9 +373,9 @@ std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMa
     std::string_view emailAddress, const ContactKeys& keys, std::string* error) {
   try {
     impl_->ensureLoaded();
-    const std::string key = emailKey(emailAddress);
-    if (key.empty()) return {};
-    return impl_->project(impl_->byEmail, key, keys, error);
+    const EmailKey key(emailAddress);
+    if (key.view().empty()) return {};
+    return impl_->project(impl_->byEmail, key.view(), keys, error);
   } catch (const std::exception& e) {
     if (error != nullptr) *error = e.what();
     return {};
@@ -376,7 +400,7 @@ std::shared_ptr<const Contact> VCardContactStore::unifiedContactWithIdentifier(s
                                                                                std::string* error) {
   try {
     impl_->ensureLoaded();
-    const auto it = impl_->byIdentifier.find(std::string(identifier));
+    const auto it = impl_->byIdentifier.find(identifier);
     if (it == impl_->byIdentifier.end()) return nullptr;
     const auto projection = impl_->projectionFor(keys);
     Impl::reportUnknownKey(*projection, error);
