@@ -371,17 +371,19 @@ std::size_t plainPrefix(std::string_view text) noexcept {
 }  // namespace
 
 void JsonTextWriter::grow(std::size_t n) {
+  constexpr std::size_t kLeast = 256;
   const std::size_t needed = at_ + n;
   const std::size_t capacity = out_.capacity();
   if (needed > capacity) {
-    out_.resize(std::max(needed, 2 * capacity));  // as appending would have grown it
+    // As appending would have grown it, but by at least 256 bytes: a description written into an
+    // empty string would otherwise be copied over from 15 bytes to 30, 60, 120 and on.
+    out_.resize(std::max({needed, 2 * capacity, at_ + kLeast}));
     return;
   }
   // Within the capacity: room for as much again as this writer has written (at least 256 bytes),
   // so that the bytes cleared ahead stay in proportion to those written. A short text clears little
   // of a large reserve, and a record written at the end of a long text (a log line that describes
   // many) does not clear room for the whole text again.
-  constexpr std::size_t kLeast = 256;
   out_.resize(std::min(capacity, std::max(needed, at_ + std::max(at_ - start_, kLeast))));
 }
 
