@@ -83,10 +83,11 @@ TEST(Json, SerialisingEscapesWhatJsonMustAndReplacesInvalidUtf8) {
   EXPECT_EQ(written("a\x01" "b\x1F"), R"("a\u0001b\u001f")");  // 0x1F: the last control character
   EXPECT_EQ(written("a\"b\\ ~"), R"("a\"b\\ ~")");
   EXPECT_EQ(written("a\x80"), "\"a\xEF\xBF\xBD\"");  // 0x80: the lowest byte that is no ASCII
-  // Texts are scanned a word at a time: every byte that needs care, at every place of texts up to
-  // three words long, alone and before another one, is written as the library writes it.
+  // Texts are scanned a block at a time (sixteen or eight bytes): every byte that needs care, at
+  // every place of texts up to two blocks and a part long, alone and before another one, is written
+  // as the library writes it.
   const auto asLibrary = [](const std::string& sample) { return Value(sample).dump(-1, ' ', false, Value::error_handler_t::replace); };
-  for (std::size_t size = 1; size <= 24; ++size) {
+  for (std::size_t size = 1; size <= 40; ++size) {
     for (std::size_t at = 0; at < size; ++at) {
       for (const char special : {'\x00', '\x1F', '"', '\\', '\x7F', '\x80', '\xFF', ' '}) {
         std::string sample(size, '~');
