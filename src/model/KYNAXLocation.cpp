@@ -91,19 +91,19 @@ void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_
   std::array<platform::JsonView, kAddressKeys> address;
   if (fixed[kAddress].isObject()) fixed[kAddress].members(addressKeys, address);
 
-  location->city = platform::stringValue(address[kLocality]);
+  platform::setStringValue(location->city, address[kLocality]);
   // The administrative area stands in only when the state code is missing altogether; a state
   // code that is present as null stays null.
-  location->stateCode = platform::stringValue(address[kStateCode] ? address[kStateCode] : address[kAdministrativeArea]);
+  platform::setStringValue(location->stateCode, address[kStateCode] ? address[kStateCode] : address[kAdministrativeArea]);
   location->latitude = platform::numberValue(fixed[kLatitude]);
   location->longitude = platform::numberValue(fixed[kLongitude]);
   location->accuracy = platform::numberValue(fixed[kAccuracy]);
   location->locationDate = KYNAXUtils::timeIntervalForMillisecondsSince1970(platform::numberValue(fixed[kTimestamp]));
-  location->street = platform::stringValue(fixed[kStreet]);
+  platform::setStringValue(location->street, fixed[kStreet]);
 
   if (const platform::JsonView labels = fixed[kLabels]; labels.isArray()) {
     for (const auto& element : labels) {
-      location->label = platform::stringValue(element.value.member("label"));
+      platform::setStringValue(location->label, element.value.member("label"));
       if (location->label) break;  // the first label that is there wins
     }
   }

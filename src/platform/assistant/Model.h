@@ -219,7 +219,7 @@ struct FieldReader {
   std::size_t next = 0;
 
   platform::JsonView take() { return found[next++]; }
-  void operator()(std::string_view /*key*/, std::optional<std::string>& v) { v = platform::stringValue(take()); }
+  void operator()(std::string_view /*key*/, std::optional<std::string>& v) { platform::setStringValue(v, take()); }
   void operator()(std::string_view /*key*/, std::optional<double>& v) {
     auto n = platform::numberValue(take());
     v = (n && std::isfinite(*n)) ? n : std::nullopt;

@@ -875,6 +875,14 @@ std::optional<std::string> stringValue(JsonView value) {
   return std::string(*text);
 }
 
+void setStringValue(std::optional<std::string>& into, JsonView value) {
+  if (const auto text = value.string()) {
+    into.emplace(*text);
+  } else {
+    into.reset();
+  }
+}
+
 std::optional<double> numberValue(JsonView value) noexcept {
   const Number n = JsonViewAccess::number(value);
   switch (n.kind) {

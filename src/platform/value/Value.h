@@ -118,6 +118,8 @@ struct JsonEntry {
 
 /// The value when it is a JSON string; nothing for any other type.
 [[nodiscard]] std::optional<std::string> stringValue(JsonView value);
+/// `into = stringValue(value)`, with the text made in place rather than made and then moved.
+void setStringValue(std::optional<std::string>& into, JsonView value);
 
 /// The value when it is a JSON number (booleans are not numbers here).
 [[nodiscard]] std::optional<double> numberValue(JsonView value) noexcept;
