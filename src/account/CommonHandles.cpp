@@ -26,14 +26,14 @@ std::optional<std::string> Common::completeNumberForPhoneNumber(const std::optio
   // left to the parser. A text that starts with one (the usual case) is kept without a scan; a
   // first byte of a longer UTF-8 sequence is no phone character as a code point either.
   const auto first = static_cast<unsigned char>(raw->empty() ? 0 : raw->front());
-  std::string kept = isPhoneCharacter(first)
-                         ? *raw
-                         : platform::suffixFromFirstMatch(*raw, isPhoneCharacter).value_or(*raw);
-  if (kept.empty()) return kept;
+  std::optional<std::string> cut;  // made only when there is junk to cut
+  if (!isPhoneCharacter(first)) cut = platform::suffixFromFirstMatch(*raw, isPhoneCharacter);
+  const std::string_view kept = cut ? std::string_view(*cut) : std::string_view(*raw);
+  if (kept.empty()) return std::string();
   if (auto canonical = platform::formatPhoneNumber(kept, defaultCountryCode(), platform::PhoneNumberStyle::Canonical)) {
     return canonical;
   }
-  return kept;
+  return std::string(kept);
 }
 
 std::vector<std::string> Common::handlesForAXPerson(const AXPerson& person) const {

@@ -35,7 +35,7 @@ std::optional<std::string> formatPhoneNumber(std::string_view text, std::string_
   key[region.size() + 1] = '\0';
   std::memcpy(key + region.size() + 2, text.data(), text.size());
   const std::string_view keyView(key, keySize);
-  if (auto cached = cache.find(keyView)) return *cached;
+  if (auto cached = cache.find(keyView)) return std::move(*cached);
   auto result = readAndWrite(text, region, style);
   cache.insert(std::string(keyView), result);
   return result;
