@@ -6,6 +6,9 @@
 #include <gtest/gtest.h>
 #include <unicode/locid.h>
 
+#include <cstdlib>
+#include <string>
+
 namespace kyn::platform {
 namespace {
 
@@ -54,9 +57,14 @@ TEST(NumberFormatting, DecimalsAreReadAsTheLocaleWritesThem) {
   IcuNumberFormatting en("en_US");
   IcuNumberFormatting de("de_DE");
   EXPECT_EQ(en.parseDecimal("1234.5"), 1234.5);
-  // Fifteen digits, the most read without ICU, round as the compiler rounds the same literals.
-  EXPECT_EQ(en.parseDecimal("0.123456789012345"), 0.123456789012345);
-  EXPECT_EQ(en.parseDecimal("98765432109876.5"), 98765432109876.5);
+  // Up to fifteen digits are read without ICU: with the point at every place, they round as strtod
+  // rounds them.
+  for (const std::string digits : {"123456789012345", "000000000098765", "999999999999999"}) {
+    for (std::size_t at = 1; at < digits.size(); ++at) {
+      const std::string text = digits.substr(0, at) + "." + digits.substr(at);
+      EXPECT_EQ(en.parseDecimal(text), std::strtod(text.c_str(), nullptr)) << text;
+    }
+  }
   EXPECT_EQ(en.parseDecimal("12345678901234567890"), 12345678901234567890.0);  // too long for the fast path
   EXPECT_EQ(en.parseDecimal("1,234.5"), 1234.5);
   EXPECT_EQ(de.parseDecimal("1234,5"), 1234.5);

@@ -90,13 +90,16 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
 }
 
 TEST_F(VCardContactStoreTest, EmailAddressesMatchIgnoringCaseInAnyScript) {
+  // An address longer than any mail system takes still matches ignoring case.
+  const std::string longAddress = std::string(300, 'l') + "@example.COM";
   book.write("a.vcf", test::vcard("UID:a\r\nEMAIL:Mixed.Case@Example.COM\r\nEMAIL: mixed.case@example.com \r\n") +
                           test::vcard("UID:b\r\nEMAIL;CHARSET=UTF-8:J\xC3\x96RG@example.org\r\nEMAIL:Stra\xC3\x9F" "e@example.net\r\n") +
-                          test::vcard("UID:c\r\nEMAIL:mailto:MIXED.case@example.com\r\n"));
+                          test::vcard("UID:c\r\nEMAIL:mailto:MIXED.case@example.com\r\n") +
+                          test::vcard("UID:d\r\nEMAIL:" + std::string(300, 'L') + "@Example.com\r\n"));
   VCardContactStore store(book.path(), "us");
   const std::pair<const char*, std::vector<std::string>> cases[] = {
       {"mixed.case@example.com", {"a", "c"}}, {"MIXED.CASE@EXAMPLE.COM ", {"a", "c"}}, {"j\xC3\xB6rg@EXAMPLE.org", {"b"}},
-      {"STRASSE@example.net", {"b"}}, {"", {}}, {"mixed.case@example", {}}};
+      {"STRASSE@example.net", {"b"}}, {"", {}}, {"mixed.case@example", {}}, {longAddress.c_str(), {"d"}}};
   for (const auto& [address, ids] : cases) EXPECT_EQ(identifiersOf(byEmail(store, address)), ids) << address;
 }
 
