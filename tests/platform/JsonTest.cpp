@@ -144,6 +144,11 @@ TEST(Json, ValueReadersReadATreeAndADocumentAlike) {
     EXPECT_TRUE(v.member("i").isInteger() && !v.member("n").isInteger() && v.member("u").isNumber());
     EXPECT_EQ(boolValue(v.member("neg")), true);
     EXPECT_FALSE(stringValue(v.member("n")));
+    std::optional<std::string> field = "before";  // set in place: a value that is no text empties it
+    setStringValue(field, v.member("s"));
+    EXPECT_EQ(field, "12abc");
+    setStringValue(field, v.member("n"));
+    EXPECT_FALSE(field);
     EXPECT_FALSE(v.member("a").member("k"));
     std::vector<std::string> items;
     for (const auto& item : v.member("a")) items.push_back(toJson(item.value.toValue()));
