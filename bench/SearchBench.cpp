@@ -534,17 +534,21 @@ class SummaryReporter final : public benchmark::ConsoleReporter {
   }
 
  private:
-  /// The time per iteration of the benchmark `base`, with or without further "/..." parts.
+  /// Whether `name` is the benchmark `base`, with or without further "/..." parts.
+  static bool isRunOf(const std::string& name, const std::string& base) {
+    return name == base || name.rfind(base + "/", 0) == 0;
+  }
+  /// The time per iteration of the benchmark `base`.
   std::optional<double> find(const std::string& base) const {
     for (const auto& [name, seconds] : times_) {
-      if (name == base || name.rfind(base + "/", 0) == 0) return seconds;
+      if (isRunOf(name, base)) return seconds;
     }
     return std::nullopt;
   }
-  /// A counter of the benchmark `base`, with or without further "/..." parts.
+  /// A counter of the benchmark `base`.
   std::optional<double> counter(const std::string& base, const std::string& counterName) const {
     for (const auto& [name, values] : counters_) {
-      if (name != base && name.rfind(base + "/", 0) != 0) continue;
+      if (!isRunOf(name, base)) continue;
       if (const auto it = values.find(counterName); it != values.end()) return it->second;
     }
     return std::nullopt;
