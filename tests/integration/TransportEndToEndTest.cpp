@@ -43,6 +43,7 @@ struct Ended {
   std::shared_ptr<Probe> command;
   int completions = 0, redirectNotices = 0;
   bool answeredOnCallerThread = false;
+  bool answeredBeforeShutdown = false;  // not only when the controller went, which answers everything
 };
 
 /// Sends one command with a controller of its own. With `waitForAnswer`, waits for the completion
@@ -68,7 +69,7 @@ Ended exchange(const std::string& host, const platform::TransportSettings& setti
     });
     if (waitForAnswer) {
       std::unique_lock lock(mutex);
-      answered.wait_for(lock, 60s, [&] { return ended.completions > 0; });
+      ended.answeredBeforeShutdown = answered.wait_for(lock, 60s, [&] { return ended.completions > 0; });
     }
   }  // the controller ends its network thread: every completion there will be has run
   center.removeObserver(observer);
@@ -123,6 +124,7 @@ TEST(TransportEndToEnd, EachFailedExchangeSaysWhy) {
     const auto& command = *ended.command;
     EXPECT_EQ(ended.completions, 1) << c.name;
     EXPECT_FALSE(ended.answeredOnCallerThread) << c.name;
+    EXPECT_EQ(ended.answeredBeforeShutdown, !c.cutShort) << c.name;
     EXPECT_EQ(command.transferError(), c.expected) << c.name << ": " << command.transferErrorDetail();
     EXPECT_NE(command.transferErrorDetail().find(c.detail), std::string::npos) << c.name;
     EXPECT_EQ(command.wasSuccessful(), c.expected == KYTransferError::None) << c.name;
@@ -207,21 +209,41 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
     box->replied = true;
     box->changed.notify_all();
   };
-  for (const std::string& host : {std::string(), kNothingListens}) {
+  // No host, a host that refuses, a host curl cannot read (it fails in the call).
+  for (const std::string& host : {std::string(), kNothingListens, std::string("bad host")}) {
     test::TempDir configDir;
     Account(configDir.path()).write(host, std::nullopt);
     Plugin plugin;
     plugin.configure(configDir.path());
-    Box box;
-    ASSERT_EQ(plugin.library().perform(searchFor({"ada@example.com"}).c_str(), receive, &box), 0);
-    std::unique_lock lock(box.mutex);
-    box.performReturned = true;
-    box.changed.notify_all();
-    ASSERT_TRUE(box.changed.wait_for(lock, 30s, [&] { return box.replied; })) << host;
-    EXPECT_TRUE(box.afterReturn) << host;
-    EXPECT_NE(box.thread, std::this_thread::get_id()) << host;
-    EXPECT_EQ(box.reply["errorCode"], 1005) << host;
+    // The second command finds the network thread idle: ended during the call, it must wake it.
+    for (int command = 0; command < 2; ++command) {
+      Box box;
+      ASSERT_EQ(plugin.library().perform(searchFor({"ada@example.com"}).c_str(), receive, &box), 0);
+      std::unique_lock lock(box.mutex);
+      box.performReturned = true;
+      box.changed.notify_all();
+      ASSERT_TRUE(box.changed.wait_for(lock, 30s, [&] { return box.replied; })) << host << command;
+      EXPECT_TRUE(box.afterReturn) << host;
+      EXPECT_NE(box.thread, std::this_thread::get_id()) << host;
+      EXPECT_EQ(box.reply["errorCode"], 1005) << host;
+    }
   }
+}
+
+// The time limit ends an exchange that stalls on a kept-alive connection, where no socket wakes
+// the network thread: only the timer can.
+TEST(TransportEndToEnd, TheTimeLimitEndsAStalledExchange) {
+  test::TempDir simDir, configDir;
+  Sim sim(simDir.path(), kNoFriends, {"--fault", "slow:60000", "--fault-path", "getlocations"});
+  Account(configDir.path()).write(localhost(sim.port()), sim.caFile(), {{"totalTimeoutMs", 1000}});
+  Plugin plugin;
+  plugin.configure(configDir.path());
+  const auto shown = plugin.performAndWait(R"({"class":"AXKynVisibilityStateSet","visible":true})");
+  ASSERT_TRUE(shown);
+  EXPECT_EQ((*shown)["class"], "AXKynVisibilitySetCompleted") << shown->dump();
+  const auto search = plugin.performAndWait(searchFor({"ada@example.com"}));
+  ASSERT_TRUE(search);
+  EXPECT_EQ((*search)["errorCode"], 1005);
 }
 
 // Host threads may call perform at once (the thread sanitizer build watches this one): every

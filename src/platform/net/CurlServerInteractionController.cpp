@@ -1,21 +1,28 @@
-// The HTTPS transport: libcurl's multi interface on one network thread per controller. Requests are
-// built on the caller's thread; the network thread moves the bytes, fills in the command and runs
-// its completion. Every command sent is answered there, also one that cannot be sent at all, so a
-// caller never sees its completion run before `sendCommand` has returned. Connections are kept alive
-// and reused between commands.
+// The HTTPS transport: libcurl's multi interface with one network thread per controller. Requests are
+// built and started on the caller's thread, which on a kept-alive connection sends the request at
+// once; the network thread carries the exchange on, fills in the command and runs its completion.
+// Every command sent is answered there, also one that cannot be sent at all, so a caller never sees
+// its completion run on its own thread. Connections are kept alive and reused between commands.
 #include "platform/log/Log.h"
 #include "platform/net/ServerInteractionController.h"
 #include "platform/net/Url.h"
 #include "platform/notify/NotificationCenter.h"
 
 #include <curl/curl.h>
+#include <sys/epoll.h>
+#include <sys/eventfd.h>
+#include <sys/timerfd.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <charconv>
+#include <cerrno>
 #include <climits>
+#include <cstdint>
 #include <condition_variable>
 #include <deque>
 #include <filesystem>
+#include <list>
 #include <mutex>
 #include <thread>
 #include <unordered_map>
@@ -50,7 +57,23 @@ struct Request {
   std::string refusalDetail;
 };
 
-/// Idle easy handles, so that a transfer need not build one afresh. Network thread only.
+/// What an ended exchange leaves for its command: read off the transfer while curl is held, and
+/// handed to the command afterwards, when curl is free for other senders.
+struct Outcome {
+  Request request;
+  bool cancelled = false;  // the transport shut down while it ran
+  CURLcode code = CURLE_OK;
+  long status = 0;
+  long connects = 0;
+  std::size_t cap = 0;
+  bool overflowed = false;
+  std::string response;
+  std::string finalUrl;
+  std::string answeredUrl;
+  std::string errorText;
+};
+
+/// Idle easy handles, so that a transfer need not build one afresh. Used with the engine's curl held.
 class HandlePool {
  public:
   /// An idle handle, else a new one; empty when curl cannot make one.
@@ -81,7 +104,7 @@ class HandlePool {
 /// back to the pool and frees the rest.
 class Transfer {
  public:
-  Transfer(Request what, EasyHandle easy, HandlePool& pool, std::size_t responseCap)
+  Transfer(Request&& what, EasyHandle easy, HandlePool& pool, std::size_t responseCap)
       : request(std::move(what)), cap(responseCap), easy_(std::move(easy)), pool_(pool) {}
   ~Transfer() {
     if (multi_ != nullptr) curl_multi_remove_handle(multi_, easy_.get());
@@ -122,6 +145,8 @@ class Transfer {
   bool overflowed = false;
   /// The URL that the last final (non-1xx) HTTP response came from.
   std::string answeredUrl;
+  /// Room for the outcome, made when the transfer starts so that ending it cannot fail.
+  std::list<Outcome> ending;
 
  private:
   EasyHandle easy_;
@@ -209,40 +234,89 @@ long curlMilliseconds(std::chrono::milliseconds limit) noexcept {
   return static_cast<long>(std::clamp<std::chrono::milliseconds::rep>(limit.count(), 1, LONG_MAX));
 }
 
+using Clock = std::chrono::steady_clock;
+
 /// The state shared by a controller and its network thread; the thread keeps it alive until it ends.
 /// The controller is the only sender and stops the engine only from its destructor, so nothing is
 /// sent after `stop`.
+///
+/// curl's handles are used by one thread at a time, under `curl_`: the sender's thread adds its
+/// transfer and runs it as far as it goes at once (on a kept-alive connection that sends the
+/// request), and the network thread carries every transfer on as its sockets become ready or curl's
+/// timer expires. The network thread sleeps in epoll without holding curl, on the sockets curl
+/// watches and a timerfd set to curl's timer, so a sender need not wake it: the server's answer or
+/// the timer does. It is woken only for work that is its own: a request that cannot start on the
+/// sender's thread, or a transfer that ended there.
 class Engine : public std::enable_shared_from_this<Engine> {
  public:
   explicit Engine(TransportSettings settings) : settings_(std::move(settings)) {
     static std::once_flag global;
     std::call_once(global, [] { curl_global_init(CURL_GLOBAL_DEFAULT); });
-    multi_.reset(curl_multi_init());
     std::error_code ec;
     if (std::filesystem::is_directory("/etc/ssl/certs", ec)) systemCaPath_ = "/etc/ssl/certs";
+    wakeFd_ = ::eventfd(0, EFD_CLOEXEC | EFD_NONBLOCK);
+    timerFd_ = ::timerfd_create(CLOCK_MONOTONIC, TFD_CLOEXEC | TFD_NONBLOCK);  // steady_clock's clock
+    epollFd_ = ::epoll_create1(EPOLL_CLOEXEC);
+    const auto watch = [this](int fd) {
+      epoll_event event{};
+      event.events = EPOLLIN;
+      event.data.fd = fd;
+      return fd >= 0 && ::epoll_ctl(epollFd_, EPOLL_CTL_ADD, fd, &event) == 0;
+    };
+    if (epollFd_ < 0 || !watch(wakeFd_) || !watch(timerFd_)) return;
+    multi_.reset(curl_multi_init());
+    if (!multi_) return;
+    curl_multi_setopt(multi_.get(), CURLMOPT_SOCKETFUNCTION, &Engine::watchSocket);
+    curl_multi_setopt(multi_.get(), CURLMOPT_SOCKETDATA, this);
+    curl_multi_setopt(multi_.get(), CURLMOPT_TIMERFUNCTION, &Engine::setTimer);
+    curl_multi_setopt(multi_.get(), CURLMOPT_TIMERDATA, this);
   }
 
   ~Engine() {
     // `stop` leaves no thread behind; should one have been started after it, it ends on its own.
     if (thread_.joinable()) thread_.detach();
+    // curl may still report sockets while its handles go, so the descriptors close last.
+    active_.clear();
+    pool_ = HandlePool();
+    multi_.reset();
+    for (const int fd : {epollFd_, timerFd_, wakeFd_}) {
+      if (fd >= 0) ::close(fd);
+    }
   }
+  Engine(const Engine&) = delete;
+  Engine& operator=(const Engine&) = delete;
 
   void send(Request request) {
-    std::unique_lock lock(mutex_);
-    queue_.push_back(std::move(request));
-    if (!thread_.joinable()) {
-      try {
-        thread_ = std::thread([self = shared_from_this()] { self->run(); });
-      } catch (...) {
-        // Without a network thread nothing would ever answer: answer here, as the one exception.
-        Request failed = std::move(queue_.back());
-        queue_.pop_back();
-        lock.unlock();
-        fail(failed, KYTransferError::NotSent, "no network thread");
+    {
+      std::unique_lock lock(mutex_);
+      if (!thread_.joinable()) {
+        try {
+          thread_ = std::thread([self = shared_from_this()] { self->run(); });
+        } catch (...) {
+          // Without a network thread nothing would ever answer: answer here, as the one exception.
+          lock.unlock();
+          fail(request, KYTransferError::NotSent, "no network thread");
+          return;
+        }
+      }
+    }
+    if (request.refusal == KYTransferError::None && usable()) {
+      std::unique_lock curl(curl_);
+      std::string_view why;
+      if (start(request, why)) {
+        armTimer();
+        const bool wake = !done_.empty();  // ended already: answering it is the thread's
+        curl.unlock();
+        if (wake) wakeThread();
         return;
       }
     }
-    wake();
+    // Refused, or not startable here: the network thread answers it (or starts it and says why not).
+    {
+      std::lock_guard lock(mutex_);
+      queue_.push_back(std::move(request));
+    }
+    wakeThread();
   }
 
   /// Fails whatever is queued or in flight, then ends the network thread. Joins it unless called on it.
@@ -251,9 +325,9 @@ class Engine : public std::enable_shared_from_this<Engine> {
     {
       std::lock_guard lock(mutex_);
       stopping_ = true;
-      wake();
       thread = std::move(thread_);
     }
+    wakeThread();
     if (!thread.joinable()) return;
     if (thread.get_id() == std::this_thread::get_id()) thread.detach();  // it ends on its own
     else thread.join();
@@ -261,10 +335,150 @@ class Engine : public std::enable_shared_from_this<Engine> {
 
  private:
   using Active = std::unordered_map<CURL*, std::unique_ptr<Transfer>>;
+  using Deadline = std::optional<Clock::time_point>;
 
-  void wake() {
-    if (multi_) curl_multi_wakeup(multi_.get());
-    wakeup_.notify_one();
+  [[nodiscard]] bool usable() const noexcept { return multi_ != nullptr; }
+
+  void wakeThread() noexcept {
+    if (usable()) {
+      const std::uint64_t one = 1;
+      [[maybe_unused]] const auto written = ::write(wakeFd_, &one, sizeof one);
+    } else {
+      std::lock_guard lock(mutex_);  // a waiter between its test and its wait must not miss this
+      wakeup_.notify_one();
+    }
+  }
+
+  /// Sets the timerfd to curl's timer, so that the sleeping network thread wakes when it is due.
+  /// Called with `curl_` held.
+  void armTimer() noexcept {
+    if (deadline_ == armed_) return;
+    itimerspec when{};  // all zero disarms it
+    if (deadline_) {
+      const auto since = std::chrono::duration_cast<std::chrono::nanoseconds>(deadline_->time_since_epoch()).count();
+      when.it_value.tv_sec = static_cast<time_t>(since / 1'000'000'000);
+      when.it_value.tv_nsec = static_cast<long>(since % 1'000'000'000);
+      if (since <= 0) when.it_value.tv_nsec = 1;  // long due, and zero would disarm it
+    }
+    if (::timerfd_settime(timerFd_, TFD_TIMER_ABSTIME, &when, nullptr) == 0) armed_ = deadline_;
+  }
+
+  /// curl's socket callback: keeps the epoll set as curl wants it. Called with `curl_` held.
+  static int watchSocket(CURL*, curl_socket_t socket, int what, void* engine, void*) noexcept {
+    const int epoll = static_cast<Engine*>(engine)->epollFd_;
+    if (what == CURL_POLL_REMOVE) {
+      ::epoll_ctl(epoll, EPOLL_CTL_DEL, socket, nullptr);  // a closed socket has left the set already
+      return 0;
+    }
+    epoll_event event{};
+    event.events = ((what & CURL_POLL_IN) != 0 ? EPOLLIN : 0u) | ((what & CURL_POLL_OUT) != 0 ? EPOLLOUT : 0u);
+    event.data.fd = socket;
+    if (::epoll_ctl(epoll, EPOLL_CTL_MOD, socket, &event) == 0) return 0;
+    if (errno == ENOENT && ::epoll_ctl(epoll, EPOLL_CTL_ADD, socket, &event) == 0) return 0;
+    return -1;  // a socket nobody watches would stall its transfer: curl fails it instead
+  }
+
+  /// curl's timer callback: when curl wants to be called with no socket ready. Called with `curl_` held.
+  static int setTimer(CURLM*, long milliseconds, void* engine) noexcept {
+    auto* self = static_cast<Engine*>(engine);
+    if (milliseconds < 0) self->deadline_.reset();
+    else self->deadline_ = Clock::now() + std::chrono::milliseconds(milliseconds);
+    return 0;
+  }
+
+  /// Runs curl's timer while it is due (adding a transfer makes it due at once), then collects the
+  /// transfers that ended. Called with `curl_` held.
+  void runDueTimer() noexcept {
+    // A bounded number of rounds: a timer still due afterwards is the network thread's.
+    for (int round = 0; round < 4 && deadline_ && *deadline_ <= Clock::now(); ++round) {
+      deadline_.reset();  // the timer fires once; curl sets it again if it wants
+      int running = 0;
+      curl_multi_socket_action(multi_.get(), CURL_SOCKET_TIMEOUT, 0, &running);
+    }
+    collectEnded();
+  }
+
+  /// Takes the ended transfers off curl into `done_`. Called with `curl_` held.
+  void collectEnded() noexcept {
+    int left = 0;
+    while (CURLMsg* message = curl_multi_info_read(multi_.get(), &left)) {
+      if (message->msg != CURLMSG_DONE) continue;
+      auto node = active_.extract(message->easy_handle);
+      if (!node.empty()) end(*node.mapped(), message->data.result, false);
+    }  // the node frees its transfer: the handle leaves curl and goes back to the pool
+  }
+
+  /// Reads what the transfer left into its outcome and moves that to `done_`. Called with `curl_` held.
+  void end(Transfer& transfer, CURLcode code, bool cancelled) noexcept {
+    Outcome& outcome = transfer.ending.front();
+    outcome.cancelled = cancelled;
+    outcome.code = code;
+    outcome.cap = transfer.cap;
+    outcome.overflowed = transfer.overflowed;
+    curl_easy_getinfo(transfer.easy(), CURLINFO_RESPONSE_CODE, &outcome.status);
+    curl_easy_getinfo(transfer.easy(), CURLINFO_NUM_CONNECTS, &outcome.connects);
+    outcome.response = std::move(transfer.response);
+    outcome.answeredUrl = std::move(transfer.answeredUrl);
+    try {
+      char* effective = nullptr;
+      curl_easy_getinfo(transfer.easy(), CURLINFO_EFFECTIVE_URL, &effective);
+      if (effective != nullptr) outcome.finalUrl = effective;
+      if (code != CURLE_OK) outcome.errorText = transfer.errorText(code);
+    } catch (...) {
+      // No memory for the words: the outcome says less, and no redirect counts without its URL.
+      outcome.answeredUrl.clear();
+    }
+    outcome.request = std::move(transfer.request);
+    done_.splice(done_.end(), transfer.ending);
+  }
+
+  /// Starts `request` and runs it as far as it goes at once. False, with `request` as it was and
+  /// `why` saying why, when it cannot start. Called with `curl_` held.
+  bool start(Request& request, std::string_view& why) noexcept {
+    std::unique_ptr<Transfer> transfer;
+    why = "the transfer could not start";
+    try {
+      EasyHandle easy = pool_.take();
+      if (!easy) {
+        why = "no transfer handle";
+        return false;
+      }
+      transfer = std::make_unique<Transfer>(std::move(request), std::move(easy), pool_, settings_.maxResponseBytes);
+      if (attach(transfer)) {
+        runDueTimer();
+        return true;
+      }
+    } catch (...) {
+      // No memory: `request` moved only if the transfer was made, and comes back from it below.
+    }
+    if (transfer) request = std::move(transfer->request);
+    return false;
+  }
+
+  /// Configures the transfer and adds it to curl; on success the engine owns it. Called with
+  /// `curl_` held.
+  bool attach(std::unique_ptr<Transfer>& transfer) {
+    if (!configure(*transfer)) return false;
+    transfer->ending.emplace_back();
+    auto [slot, added] = active_.try_emplace(transfer->easy());
+    if (!added) return false;
+    if (!transfer->attach(multi_.get())) {
+      active_.erase(slot);
+      return false;
+    }
+    slot->second = std::move(transfer);
+    return true;
+  }
+
+  /// Starts a request on the network thread, answering it when it cannot start.
+  void startOnThread(Request request) noexcept {
+    std::string_view why;
+    bool started;
+    {
+      std::lock_guard curl(curl_);
+      started = start(request, why);
+    }
+    if (!started) fail(request, KYTransferError::NotSent, why);
   }
 
   /// Announces a redirect and runs the completion: the command's last step, exactly once.
@@ -302,9 +516,10 @@ class Engine : public std::enable_shared_from_this<Engine> {
   }
 
   void run() noexcept {
-    Active active;
+    std::deque<Request> incoming;
+    std::list<Outcome> ended;
+    int timeout = -1;
     for (;;) {
-      std::deque<Request> incoming;
       bool stopping;
       {
         std::lock_guard lock(mutex_);
@@ -314,58 +529,64 @@ class Engine : public std::enable_shared_from_this<Engine> {
       for (auto& request : incoming) {
         if (request.refusal != KYTransferError::None) fail(request, request.refusal, request.refusalDetail);
         else if (stopping) fail(request, KYTransferError::Cancelled, "the transport shut down");
-        else begin(std::move(request), active);
+        else if (!usable()) fail(request, KYTransferError::NotSent, "no transfer handle");
+        else startOnThread(std::move(request));
       }
-      if (stopping) {
-        for (auto& [easy, transfer] : active) {
-          const auto command = transfer->request.command;
-          const std::string url = std::move(transfer->request.url);
-          transfer.reset();
-          fail(command, url, KYTransferError::Cancelled, "the transport shut down");
-        }
-        return;
+      incoming.clear();
+      if (stopping) return cancelAll();
+      if (!usable()) {
+        std::unique_lock lock(mutex_);
+        wakeup_.wait(lock, [this] { return stopping_ || !queue_.empty(); });
+        continue;
       }
-      if (multi_) {
-        int running = 0;
-        curl_multi_perform(multi_.get(), &running);
-        int left = 0;
-        while (CURLMsg* message = curl_multi_info_read(multi_.get(), &left)) {
-          if (message->msg != CURLMSG_DONE) continue;
-          const CURLcode code = message->data.result;
-          auto node = active.extract(message->easy_handle);
-          if (!node.empty()) finish(std::move(node.mapped()), code);
-        }
+      {
+        std::lock_guard curl(curl_);
+        ended.splice(ended.end(), done_);
+        // A timer that cannot be set would never wake the thread: then it sleeps at most 100 ms.
+        if (ended.empty()) armTimer();
+        timeout = deadline_ == armed_ ? -1 : 100;
       }
-      waitForWork(!active.empty());
+      if (!ended.empty()) {
+        for (auto& outcome : ended) finish(outcome);
+        ended.clear();
+        continue;
+      }
+      waitAndRun(timeout);
     }
   }
 
-  void waitForWork(bool transfersRunning) {
-    if (multi_) {
-      curl_multi_poll(multi_.get(), nullptr, 0, 1000, nullptr);
-      return;
+  /// Sleeps until a watched socket is ready, curl's timer is due or a sender wakes the thread (or
+  /// `timeout` milliseconds have passed), and lets curl carry the transfers on.
+  void waitAndRun(int timeout) noexcept {
+    epoll_event events[16];
+    const int ready = ::epoll_wait(epollFd_, events, 16, timeout);
+    std::lock_guard curl(curl_);
+    int running = 0;
+    for (int i = 0; i < ready; ++i) {
+      const int fd = events[i].data.fd;
+      if (fd == wakeFd_ || fd == timerFd_) {  // read, so that they stop being ready
+        std::uint64_t count = 0;
+        [[maybe_unused]] const auto read = ::read(fd, &count, sizeof count);
+        continue;
+      }
+      const std::uint32_t what = events[i].events;
+      const int mask = ((what & EPOLLIN) != 0 ? CURL_CSELECT_IN : 0) | ((what & EPOLLOUT) != 0 ? CURL_CSELECT_OUT : 0) |
+                       ((what & (EPOLLERR | EPOLLHUP)) != 0 ? CURL_CSELECT_ERR : 0);
+      curl_multi_socket_action(multi_.get(), fd, mask, &running);
     }
-    // Without a multi handle there is nothing to poll: wait for requests to turn down.
-    std::unique_lock lock(mutex_);
-    if (!transfersRunning) wakeup_.wait(lock, [this] { return stopping_ || !queue_.empty(); });
+    runDueTimer();
   }
 
-  void begin(Request request, Active& active) noexcept {
-    const auto command = request.command;
-    try {
-      EasyHandle easy = multi_ ? pool_.take() : EasyHandle();
-      if (!easy) return fail(request, KYTransferError::NotSent, "no transfer handle");
-      auto transfer = std::make_unique<Transfer>(std::move(request), std::move(easy), pool_, settings_.maxResponseBytes);
-      if (!configure(*transfer) || !transfer->attach(multi_.get())) {
-        const std::string url = transfer->request.url;
-        transfer.reset();
-        return fail(command, url, KYTransferError::NotSent, "the transfer could not start");
-      }
-      CURL* key = transfer->easy();
-      active.emplace(key, std::move(transfer));
-    } catch (const std::exception& e) {
-      fail(command, "(unsent)", KYTransferError::NotSent, e.what());
+  /// Ends whatever is still in flight as cancelled; what has ended is answered as it ended.
+  void cancelAll() noexcept {
+    std::list<Outcome> ended;
+    {
+      std::lock_guard curl(curl_);
+      for (auto& [easy, transfer] : active_) end(*transfer, CURLE_OK, true);
+      active_.clear();
+      ended.splice(ended.end(), done_);
     }
+    for (auto& outcome : ended) finish(outcome);
   }
 
   bool configure(Transfer& transfer) {
@@ -412,56 +633,62 @@ class Engine : public std::enable_shared_from_this<Engine> {
     return true;
   }
 
-  void finish(std::unique_ptr<Transfer> transfer, CURLcode code) noexcept {
-    const std::shared_ptr<KYJSONCommand> command = transfer->request.command;
+  /// Hands an ended exchange to its command and completes it. Network thread, without `curl_`.
+  void finish(Outcome& outcome) noexcept {
+    if (outcome.cancelled) return fail(outcome.request, KYTransferError::Cancelled, "the transport shut down");
+    const std::shared_ptr<KYJSONCommand> command = outcome.request.command;
+    const std::string& url = outcome.request.url;
     try {
-      long status = 0;
-      long connects = 0;
-      char* effective = nullptr;
-      curl_easy_getinfo(transfer->easy(), CURLINFO_RESPONSE_CODE, &status);
-      curl_easy_getinfo(transfer->easy(), CURLINFO_NUM_CONNECTS, &connects);
-      curl_easy_getinfo(transfer->easy(), CURLINFO_EFFECTIVE_URL, &effective);
-      const std::string finalUrl = effective != nullptr ? effective : "";
-
-      const KYTransferError error = classify(code, status, transfer->overflowed);
+      const KYTransferError error = classify(outcome.code, outcome.status, outcome.overflowed);
       std::string detail;
-      if (error == KYTransferError::HTTPStatus) detail = "HTTP " + std::to_string(status);
-      else if (error == KYTransferError::ResponseTooLarge) detail = "over " + std::to_string(transfer->cap) + " bytes";
+      if (error == KYTransferError::HTTPStatus) detail = "HTTP " + std::to_string(outcome.status);
+      else if (error == KYTransferError::ResponseTooLarge) detail = "over " + std::to_string(outcome.cap) + " bytes";
       else if (error == KYTransferError::RedirectRefused) {
         // Only the host: curl's effective URL may carry the credentials.
-        detail = transfer->errorText(code) + ", at " + authorityOf(finalUrl).value_or("an unreadable URL");
+        detail = outcome.errorText + ", at " + authorityOf(outcome.finalUrl).value_or("an unreadable URL");
       }
-      else if (error != KYTransferError::None) detail = transfer->errorText(code);
-      command->setTransferResult(error, status > 0 ? std::optional(HTTPResponse{status}) : std::nullopt,
+      else if (error != KYTransferError::None) detail = outcome.errorText;
+      command->setTransferResult(error, outcome.status > 0 ? std::optional(HTTPResponse{outcome.status}) : std::nullopt,
                                  std::move(detail));
-      if (code == CURLE_OK) {
-        command->setResponseBody(transfer->response, JsonLimits{settings_.maxResponseBytes, JsonLimits{}.maxDepth});
+      if (outcome.code == CURLE_OK) {
+        command->setResponseBody(outcome.response, JsonLimits{settings_.maxResponseBytes, JsonLimits{}.maxDepth});
       }
-      Log::shared().log(LogLevel::Debug, "Request to %@ ended: HTTP %ld, %ld new connection(s)", transfer->request.url,
-                        status, connects);
-      if (error != KYTransferError::None) logFailure(transfer->request.url, *command);
+      Log::shared().log(LogLevel::Debug, "Request to %@ ended: HTTP %ld, %ld new connection(s)", url, outcome.status,
+                        outcome.connects);
+      if (error != KYTransferError::None) logFailure(url, *command);
 
       // A redirect counts only when the host it led to has answered with an HTTP response (over
       // https that means after a verified handshake) and the redirect itself was allowed. A
-      // redirect that ended nowhere must not become the server of every later command.
-      if (error != KYTransferError::RedirectRefused && !finalUrl.empty() && transfer->answeredUrl == finalUrl) {
-        const auto from = authorityOf(transfer->request.url);
-        if (auto to = authorityOf(finalUrl); to && from && *to != *from) {
-          command->setRedirect(transfer->request.host, *to);
+      // redirect that ended nowhere must not become the server of every later command. An
+      // exchange that ended where it began was not redirected.
+      if (error != KYTransferError::RedirectRefused && !outcome.finalUrl.empty() && outcome.finalUrl != url &&
+          outcome.answeredUrl == outcome.finalUrl) {
+        const auto from = authorityOf(url);
+        if (auto to = authorityOf(outcome.finalUrl); to && from && *to != *from) {
+          command->setRedirect(outcome.request.host, *to);
         }
       }
     } catch (const std::exception& e) {
       command->setTransferResult(KYTransferError::ConnectionFailed, std::nullopt);
-      Log::shared().error("Request to %@ could not be read: %@", transfer->request.url, e.what());
+      Log::shared().error("Request to %@ could not be read: %@", url, e.what());
     }
-    transfer.reset();
     complete(command);
   }
 
   TransportSettings settings_;
   std::string systemCaPath_;
-  MultiHandle multi_;
-  HandlePool pool_;  // network thread only; its handles go before the multi handle does
+  int wakeFd_ = -1;   // written to wake the network thread
+  int timerFd_ = -1;  // expires when curl's timer is due
+  int epollFd_ = -1;  // those two and the sockets curl wants watched
+
+  // curl and what it reaches, used by one thread at a time.
+  std::mutex curl_;
+  MultiHandle multi_;  // none when the engine could not be set up: every request is then refused
+  HandlePool pool_;    // its handles go before the multi handle does
+  Active active_;
+  std::list<Outcome> done_;    // ended, for the network thread to answer
+  Deadline deadline_;          // when curl wants to be called with no socket ready
+  Deadline armed_;             // what the timerfd is set to
 
   std::mutex mutex_;
   std::condition_variable wakeup_;  // only needed without a multi handle

@@ -17,7 +17,7 @@ class KYServerInteractionController {
   /// when the exchange has ended, whatever happened on the wire (a command without a host ends at
   /// once), the command is filled in (result, HTTP response or why there is none, redirect facts), a
   /// redirect is announced on the default notification centre, and the completion block is called
-  /// exactly once, on the controller's network thread, after `sendCommand` has returned. Destroying
+  /// exactly once, on the controller's network thread, never within `sendCommand`. Destroying
   /// the controller ends what is in flight as cancelled, likewise on the network thread.
   virtual void sendCommand(std::shared_ptr<KYJSONCommand> command, std::function<void()> completion) = 0;
 };
