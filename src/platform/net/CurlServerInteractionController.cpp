@@ -518,7 +518,6 @@ class Engine : public std::enable_shared_from_this<Engine> {
   void run() noexcept {
     std::deque<Request> incoming;
     std::list<Outcome> ended;
-    int timeout = -1;
     for (;;) {
       bool stopping;
       {
@@ -539,6 +538,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
         wakeup_.wait(lock, [this] { return stopping_ || !queue_.empty(); });
         continue;
       }
+      int timeout;
       {
         std::lock_guard curl(curl_);
         ended.splice(ended.end(), done_);
