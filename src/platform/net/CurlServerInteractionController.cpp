@@ -15,6 +15,7 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <charconv>
 #include <cerrno>
 #include <climits>
@@ -558,8 +559,8 @@ class Engine : public std::enable_shared_from_this<Engine> {
   /// Sleeps until a watched socket is ready, curl's timer is due or a sender wakes the thread (or
   /// `timeout` milliseconds have passed), and lets curl carry the transfers on.
   void waitAndRun(int timeout) noexcept {
-    epoll_event events[16];
-    const int ready = ::epoll_wait(epollFd_, events, 16, timeout);
+    std::array<epoll_event, 16> events;
+    const int ready = ::epoll_wait(epollFd_, events.data(), static_cast<int>(events.size()), timeout);
     std::lock_guard curl(curl_);
     int running = 0;
     for (int i = 0; i < ready; ++i) {
