@@ -235,7 +235,8 @@ TEST(TransportEndToEnd, ACommandSentOnIsAnsweredAfterPerformReturns) {
 TEST(TransportEndToEnd, TheTimeLimitEndsAStalledExchange) {
   test::TempDir simDir, configDir;
   Sim sim(simDir.path(), kNoFriends, {"--fault", "slow:60000", "--fault-path", "getlocations"});
-  Account(configDir.path()).write(localhost(sim.port()), sim.caFile(), {{"totalTimeoutMs", 1000}});
+  // Room enough for the first exchange and its handshake, under the sanitizers too.
+  Account(configDir.path()).write(localhost(sim.port()), sim.caFile(), {{"totalTimeoutMs", 2000}});
   Plugin plugin;
   plugin.configure(configDir.path());
   const auto shown = plugin.performAndWait(R"({"class":"AXKynVisibilityStateSet","visible":true})");
