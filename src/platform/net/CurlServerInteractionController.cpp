@@ -1,8 +1,9 @@
 // The HTTPS transport: libcurl's multi interface with one network thread per controller. Requests are
-// built and started on the caller's thread, which on a kept-alive connection sends the request at
-// once; the network thread carries the exchange on, fills in the command and runs its completion.
-// Every command sent is answered there, also one that cannot be sent at all, so a caller never sees
-// its completion run on its own thread. Connections are kept alive and reused between commands.
+// built on the caller's thread and, once a server has answered, started there too, which on the
+// kept-alive connection sends the request at once; the network thread carries the exchange on,
+// fills in the command and runs its completion. Every command sent is answered there, also one that
+// cannot be sent at all, so a caller never sees its completion run on its own thread. Connections
+// are kept alive and reused between commands.
 #include "platform/log/Log.h"
 #include "platform/net/ServerInteractionController.h"
 #include "platform/net/Url.h"
@@ -241,13 +242,14 @@ using Clock = std::chrono::steady_clock;
 /// The controller is the only sender and stops the engine only from its destructor, so nothing is
 /// sent after `stop`.
 ///
-/// curl's handles are used by one thread at a time, under `curl_`: the sender's thread adds its
-/// transfer and runs it as far as it goes at once (on a kept-alive connection that sends the
-/// request), and the network thread carries every transfer on as its sockets become ready or curl's
-/// timer expires. The network thread sleeps in epoll without holding curl, on the sockets curl
-/// watches and a timerfd set to curl's timer, so a sender need not wake it: the server's answer or
-/// the timer does. It is woken only for work that is its own: a request that cannot start on the
-/// sender's thread, or a transfer that ended there.
+/// curl's handles are used by one thread at a time, under `curl_`. Once a server has answered (so
+/// that a kept-alive connection is likely), the sender's thread adds its transfer and runs it as far
+/// as it goes at once, which on that connection sends the request; before that, the network thread
+/// starts it, so that no sender waits for a name lookup, a connection or a handshake. The network
+/// thread carries every transfer on as its sockets become ready or curl's timer expires. It sleeps
+/// in epoll without holding curl, on the sockets curl watches and a timerfd set to curl's timer, so
+/// a sender need not wake it: the server's answer or the timer does. It is woken only for work that
+/// is its own: a request not started on the sender's thread, or a transfer that ended there.
 class Engine : public std::enable_shared_from_this<Engine> {
  public:
   explicit Engine(TransportSettings settings) : settings_(std::move(settings)) {
@@ -304,7 +306,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
     if (request.refusal == KYTransferError::None && usable()) {
       std::unique_lock curl(curl_);
       std::string_view why;
-      if (start(request, why)) {
+      if (answered_ && start(request, why)) {
         armTimer();
         const bool wake = !done_.empty();  // ended already: answering it is the thread's
         curl.unlock();
@@ -312,7 +314,8 @@ class Engine : public std::enable_shared_from_this<Engine> {
         return;
       }
     }
-    // Refused, or not startable here: the network thread answers it (or starts it and says why not).
+    // Refused, not to be started here, or not startable here: the network thread answers it (or
+    // starts it, or says why it cannot).
     {
       std::lock_guard lock(mutex_);
       queue_.push_back(std::move(request));
@@ -430,6 +433,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
       outcome.answeredUrl.clear();
     }
     outcome.request = std::move(transfer.request);
+    if (outcome.status > 0) answered_ = true;
     done_.splice(done_.end(), transfer.ending);
   }
 
@@ -690,6 +694,7 @@ class Engine : public std::enable_shared_from_this<Engine> {
   std::list<Outcome> done_;    // ended, for the network thread to answer
   Deadline deadline_;          // when curl wants to be called with no socket ready
   Deadline armed_;             // what the timerfd is set to
+  bool answered_ = false;      // a server has answered: senders start their own transfers
 
   std::mutex mutex_;
   std::condition_variable wakeup_;  // only needed without a multi handle
