@@ -6,7 +6,9 @@
 //   - the plug-in's own cost per command without the network: a controller that answers at once
 //     with the answer kyn-sim gave;
 //   - decoding 10 to 10,000 friend entries, the own-location record and the geofence result;
-//   - the first command after loading the plug-in.
+//   - the first command after loading the plug-in;
+//   - what waking a host thread costs on this machine, which a reply through the plug-in pays and
+//     the bare client does not.
 // The summary at the end sets each figure beside its target.
 #include "Harness.h"
 #include "commands/GetLocationsCmd.h"
@@ -22,8 +24,11 @@
 
 #include <benchmark/benchmark.h>
 #include <curl/curl.h>
+#include <pthread.h>
+#include <sched.h>
 
 #include <algorithm>
+#include <atomic>
 #include <chrono>
 #include <cstdio>
 #include <cstdlib>
@@ -32,6 +37,7 @@
 #include <map>
 #include <memory>
 #include <sstream>
+#include <thread>
 #include <vector>
 
 namespace {
@@ -313,6 +319,60 @@ void BM_WarmSideBySide(benchmark::State& state) {
 }
 BENCHMARK(BM_WarmSideBySide)->DenseRange(0, kKinds - 1)->UseManualTime()->MinTime(2.0)->Unit(benchmark::kMicrosecond);
 
+/// Runs the calling thread on `cpu` alone; false where it cannot.
+bool runOn(int cpu) {
+  cpu_set_t set;
+  CPU_ZERO(&set);
+  CPU_SET(cpu, &set);
+  return pthread_setaffinity_np(pthread_self(), sizeof set, &set) == 0;
+}
+
+/// What waking a host costs by itself on this machine: a reply through the plug-in comes on its
+/// network thread, and the host thread that waits for it must be woken; the bare client reads the
+/// answer on its own thread. Here a host thread waits for a reply box (host::Reply, as the warm rows
+/// do) on a processor of its own that has gone idle, as it does while a server answers; the time is
+/// from the delivery of the reply to the moment the host thread runs again.
+void BM_ReplyHandOffToAWaitingHost(benchmark::State& state) {
+  using Clock = std::chrono::steady_clock;
+  const bool twoCpus = std::thread::hardware_concurrency() >= 2;
+  std::atomic<host::Reply*> box{nullptr};
+  std::atomic<Clock::rep> wokeAt{0};
+  std::atomic<bool> done{false};
+  std::thread hostThread([&] {
+    if (twoCpus) (void)runOn(1);
+    for (;;) {
+      host::Reply reply;
+      box.store(&reply);
+      (void)reply.wait(std::chrono::seconds(10));
+      wokeAt.store(Clock::now().time_since_epoch().count());
+      while (box.load() == &reply) std::this_thread::yield();  // until the delivering side is done with it
+      if (done.load()) return;
+    }
+  });
+  cpu_set_t allowed;
+  const bool pinned = twoCpus && pthread_getaffinity_np(pthread_self(), sizeof allowed, &allowed) == 0 && runOn(0);
+  for (auto _ : state) {
+    host::Reply* reply = nullptr;
+    while ((reply = box.load()) == nullptr) std::this_thread::yield();
+    std::this_thread::sleep_for(std::chrono::microseconds(200));
+    wokeAt.store(0);
+    const auto delivered = Clock::now();
+    host::Reply::receive("{}", reply);
+    while (wokeAt.load() == 0) std::this_thread::yield();
+    state.SetIterationTime(std::chrono::duration<double>(Clock::duration(wokeAt.load()) - delivered.time_since_epoch()).count());
+    box.store(nullptr);
+  }
+  // The host thread waits for one more reply, which lets it see that it is done.
+  done.store(true);
+  host::Reply* last = nullptr;
+  while ((last = box.load()) == nullptr) std::this_thread::yield();
+  host::Reply::receive("{}", last);
+  box.store(nullptr);
+  hostThread.join();
+  if (pinned) (void)pthread_setaffinity_np(pthread_self(), sizeof allowed, &allowed);
+}
+BENCHMARK(BM_ReplyHandOffToAWaitingHost)->UseManualTime()->Iterations(2000)->Unit(benchmark::kMicrosecond);
+
 /// The Python client times its own loop (about two seconds) and prints microseconds per exchange;
 /// the benchmark reports that figure as the time of one iteration.
 void BM_PythonClient(benchmark::State& state) {
@@ -485,6 +545,9 @@ class SummaryReporter final : public benchmark::ConsoleReporter {
                 fixed(*bare, 0) + " us",
             "+" + fixed(*added, 0) + " us", "<= +100 us", *added <= 100);
       }
+    }
+    if (const auto handOff = find("BM_ReplyHandOffToAWaitingHost")) {
+      row("  a reply's wake-up of a host asleep on another processor", fixed(*handOff * 1e6, 0) + " us", "", std::nullopt);
     }
     for (int kind = 0; kind < kKinds; ++kind) {
       const auto own = find("BM_PluginCostWithoutNetwork/" + std::to_string(kind));
