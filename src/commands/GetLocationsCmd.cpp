@@ -143,7 +143,11 @@ Value GetLocationsCmd::jsonBodyDictionary() const {
 
 std::string GetLocationsCmd::jsonBody() const {
   // The base's members as text, then this command's after them: the text of the whole dictionary.
-  std::string text = platform::toJson(KYNBaseCmd::jsonBodyDictionary());
+  // The base's members are the client context, made once for the process: so is their text.
+  static const std::string baseText = platform::toJson(KYNBaseCmd::jsonBodyDictionary());
+  std::string text;
+  text.reserve(baseText.size() + 512);
+  text = baseText;
   text.pop_back();  // the closing brace
   bool first = text.size() == 1;
   {

@@ -67,9 +67,9 @@ void KYNAXLocation::decodeHandle(std::optional<std::string> handle, std::shared_
   services().log().notice("AXPerson found: %@", person);
 
   auto attribute = std::make_shared<AXPersonAttribute>();
-  attribute->object = person;
+  attribute->object = std::move(person);
   attribute->data = std::move(handle);
-  location->friend_ = attribute;
+  location->friend_ = std::move(attribute);
 
   // Each object's members are read in one walk over it.
   if (const platform::JsonView distance = entryMembers[0]) {
