@@ -27,9 +27,9 @@ platform::ContactKeys ContactsUtilities::contactKeys() {
 
 namespace {
 
-/// The key list of every look-up, made once.
-const platform::ContactKeys& fetchKeys() {
-  static const platform::ContactKeys keys = ContactsUtilities::contactKeys();
+/// The key list of every look-up, made once, so that the store reads it once.
+const platform::ContactKeySet& fetchKeys() {
+  static const platform::ContactKeySet keys(ContactsUtilities::contactKeys());
   return keys;
 }
 

@@ -18,6 +18,12 @@ class FakeContactStore final : public platform::ContactStore {
   /// Adds a contact and returns it for further setting.
   platform::Contact& add(std::string identifier);
 
+  // A prepared key set is read as its keys.
+  using platform::ContactStore::unifiedContactsMatchingEmailAddress;
+  using platform::ContactStore::unifiedContactsMatchingName;
+  using platform::ContactStore::unifiedContactsMatchingPhoneNumber;
+  using platform::ContactStore::unifiedContactWithIdentifier;
+
   Contacts unifiedContactsMatchingEmailAddress(std::string_view emailAddress, const platform::ContactKeys& keys,
                                                std::string* error) override;
   Contacts unifiedContactsMatchingPhoneNumber(std::string_view phoneNumber, const platform::ContactKeys& keys,

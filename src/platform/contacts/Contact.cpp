@@ -5,6 +5,7 @@
 
 #include <algorithm>
 #include <array>
+#include <atomic>
 #include <tuple>
 
 namespace kyn::platform {
@@ -88,6 +89,11 @@ bool isPropertyWithoutValue(std::string_view key) {
 }
 
 }  // namespace
+
+ContactKeySet::ContactKeySet(ContactKeys keys) : keys_(std::move(keys)) {
+  static std::atomic<std::uint64_t> made{0};
+  id_ = ++made;
+}
 
 ContactProjection::ContactProjection(ContactKeys keys) : keys_(std::move(keys)) {
   for (const std::string& key : keys_) {

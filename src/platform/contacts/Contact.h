@@ -51,6 +51,20 @@ inline constexpr std::string_view InstantMessageAddresses = "instantMessageAddre
 
 using ContactKeys = std::vector<std::string>;
 
+/// A key list made once for many look-ups. Its keys never change, so a store that has read them
+/// knows them again by the list's number, without comparing them.
+class ContactKeySet {
+ public:
+  explicit ContactKeySet(ContactKeys keys);
+  [[nodiscard]] const ContactKeys& keys() const noexcept { return keys_; }
+  /// Unique among the sets of the process.
+  [[nodiscard]] std::uint64_t id() const noexcept { return id_; }
+
+ private:
+  ContactKeys keys_;
+  std::uint64_t id_;
+};
+
 enum class ContactType { Person, Organization };
 
 /// One entry of a multi-valued property: a value and its label ("home", "work", "mobile", "fax",

@@ -34,6 +34,26 @@ class ContactStore {
   /// for an assistant that turns a spoken name into a person. May scan the book.
   [[nodiscard]] virtual std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(
       std::string_view name, const ContactKeys& keys, std::string* error) = 0;
+
+  // The same look-ups with a key list made once for many of them, which a store may read once for
+  // all: a command looks up every friend with the same keys.
+  [[nodiscard]] virtual std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingEmailAddress(
+      std::string_view emailAddress, const ContactKeySet& keys, std::string* error) {
+    return unifiedContactsMatchingEmailAddress(emailAddress, keys.keys(), error);
+  }
+  [[nodiscard]] virtual std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingPhoneNumber(
+      std::string_view phoneNumber, const ContactKeySet& keys, std::string* error) {
+    return unifiedContactsMatchingPhoneNumber(phoneNumber, keys.keys(), error);
+  }
+  [[nodiscard]] virtual std::shared_ptr<const Contact> unifiedContactWithIdentifier(std::string_view identifier,
+                                                                                    const ContactKeySet& keys,
+                                                                                    std::string* error) {
+    return unifiedContactWithIdentifier(identifier, keys.keys(), error);
+  }
+  [[nodiscard]] virtual std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(
+      std::string_view name, const ContactKeySet& keys, std::string* error) {
+    return unifiedContactsMatchingName(name, keys.keys(), error);
+  }
 };
 
 }  // namespace kyn::platform

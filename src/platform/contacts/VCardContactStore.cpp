@@ -225,15 +225,27 @@ struct VCardContactStore::Impl {
   std::once_flag phoneIndexOnce;
   ContactIndex byPhone;
 
-  // Every look-up of a command asks for the same keys: they are read once for all of them.
+  // Every look-up of a command asks for the same keys: they are read once for all of them. A key set
+  // that was read is known again by its number.
   std::mutex projectionMutex;
   std::shared_ptr<const ContactProjection> lastProjection;
+  std::uint64_t lastSet = 0;  // the set whose keys `lastProjection` holds; 0 for none
 
   std::shared_ptr<const ContactProjection> projectionFor(const ContactKeys& keys) {
     std::lock_guard lock(projectionMutex);
     if (!lastProjection || !sameKeys(lastProjection->keys(), keys)) {
       lastProjection = std::make_shared<const ContactProjection>(keys);
+      lastSet = 0;
     }
+    return lastProjection;
+  }
+  std::shared_ptr<const ContactProjection> projectionFor(const ContactKeySet& set) {
+    std::lock_guard lock(projectionMutex);
+    if (lastProjection && lastSet == set.id()) return lastProjection;
+    if (!lastProjection || !sameKeys(lastProjection->keys(), set.keys())) {
+      lastProjection = std::make_shared<const ContactProjection>(set.keys());
+    }
+    lastSet = set.id();
     return lastProjection;
   }
 
@@ -343,8 +355,9 @@ struct VCardContactStore::Impl {
     }
   }
 
+  template <class Keys>
   std::vector<std::shared_ptr<const Contact>> project(const ContactIndex& index, std::string_view key,
-                                                      const ContactKeys& keys, std::string* error) {
+                                                      const Keys& keys, std::string* error) {
     std::vector<std::shared_ptr<const Contact>> out;
     const auto it = index.find(key);
     if (it == index.end()) return out;
@@ -352,6 +365,68 @@ struct VCardContactStore::Impl {
     out.reserve(it->second.size());
     for (const std::uint32_t position : it->second) out.push_back(projection->share(contacts[position]));
     reportUnknownKey(*projection, error);
+    return out;
+  }
+
+  template <class Keys>
+  std::vector<std::shared_ptr<const Contact>> withEmailAddress(std::string_view emailAddress, const Keys& keys,
+                                                               std::string* error) {
+    try {
+      ensureLoaded();
+      const EmailKey key(emailAddress);
+      if (key.view().empty()) return {};
+      return project(byEmail, key.view(), keys, error);
+    } catch (const std::exception& e) {
+      if (error != nullptr) *error = e.what();
+      return {};
+    }
+  }
+
+  template <class Keys>
+  std::vector<std::shared_ptr<const Contact>> withPhoneNumber(std::string_view phoneNumber, const Keys& keys,
+                                                              std::string* error) {
+    try {
+      ensurePhoneIndex();
+      const std::string key = phoneKey(phoneNumber, region);
+      if (key.empty()) return {};
+      return project(byPhone, key, keys, error);
+    } catch (const std::exception& e) {
+      if (error != nullptr) *error = e.what();
+      return {};
+    }
+  }
+
+  template <class Keys>
+  std::shared_ptr<const Contact> withIdentifier(std::string_view identifier, const Keys& keys, std::string* error) {
+    try {
+      ensureLoaded();
+      const auto it = byIdentifier.find(identifier);
+      if (it == byIdentifier.end()) return nullptr;
+      const auto projection = projectionFor(keys);
+      reportUnknownKey(*projection, error);
+      return projection->share(contacts[it->second]);
+    } catch (const std::exception& e) {
+      if (error != nullptr) *error = e.what();
+      return nullptr;
+    }
+  }
+
+  template <class Keys>
+  std::vector<std::shared_ptr<const Contact>> withName(std::string_view name, const Keys& keys, std::string* error) {
+    std::vector<std::shared_ptr<const Contact>> out;
+    try {
+      ensureLoaded();
+      // A name typed by the user is looked for once per command, so the book is scanned.
+      const std::string localeId = services().locale.get()->localeId();
+      const auto projection = projectionFor(keys);
+      for (const auto& contact : contacts) {
+        if (contactMatchesName(*contact, name, localeId)) out.push_back(projection->share(contact));
+      }
+      if (!out.empty()) reportUnknownKey(*projection, error);
+    } catch (const std::exception& e) {
+      if (error != nullptr) *error = e.what();
+      out.clear();
+    }
     return out;
   }
 };
@@ -371,68 +446,42 @@ std::size_t VCardContactStore::load() {
 
 std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingEmailAddress(
     std::string_view emailAddress, const ContactKeys& keys, std::string* error) {
-  try {
-    impl_->ensureLoaded();
-    const EmailKey key(emailAddress);
-    if (key.view().empty()) return {};
-    return impl_->project(impl_->byEmail, key.view(), keys, error);
-  } catch (const std::exception& e) {
-    if (error != nullptr) *error = e.what();
-    return {};
-  }
+  return impl_->withEmailAddress(emailAddress, keys, error);
+}
+std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingEmailAddress(
+    std::string_view emailAddress, const ContactKeySet& keys, std::string* error) {
+  return impl_->withEmailAddress(emailAddress, keys, error);
 }
 
 std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingPhoneNumber(
     std::string_view phoneNumber, const ContactKeys& keys, std::string* error) {
-  try {
-    impl_->ensurePhoneIndex();
-    const std::string key = phoneKey(phoneNumber, impl_->region);
-    if (key.empty()) return {};
-    return impl_->project(impl_->byPhone, key, keys, error);
-  } catch (const std::exception& e) {
-    if (error != nullptr) *error = e.what();
-    return {};
-  }
+  return impl_->withPhoneNumber(phoneNumber, keys, error);
+}
+std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingPhoneNumber(
+    std::string_view phoneNumber, const ContactKeySet& keys, std::string* error) {
+  return impl_->withPhoneNumber(phoneNumber, keys, error);
 }
 
 std::shared_ptr<const Contact> VCardContactStore::unifiedContactWithIdentifier(std::string_view identifier,
                                                                                const ContactKeys& keys,
                                                                                std::string* error) {
-  try {
-    impl_->ensureLoaded();
-    const auto it = impl_->byIdentifier.find(identifier);
-    if (it == impl_->byIdentifier.end()) return nullptr;
-    const auto projection = impl_->projectionFor(keys);
-    Impl::reportUnknownKey(*projection, error);
-    return projection->share(impl_->contacts[it->second]);
-  } catch (const std::exception& e) {
-    if (error != nullptr) *error = e.what();
-    return nullptr;
-  }
+  return impl_->withIdentifier(identifier, keys, error);
 }
-
-}  // namespace kyn::platform
-
-namespace kyn::platform {
+std::shared_ptr<const Contact> VCardContactStore::unifiedContactWithIdentifier(std::string_view identifier,
+                                                                               const ContactKeySet& keys,
+                                                                               std::string* error) {
+  return impl_->withIdentifier(identifier, keys, error);
+}
 
 std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingName(std::string_view name,
                                                                                          const ContactKeys& keys,
                                                                                          std::string* error) {
-  std::vector<std::shared_ptr<const Contact>> out;
-  try {
-    impl_->ensureLoaded();
-    // A name typed by the user is looked for once per command, so the book is scanned.
-    const std::string localeId = services().locale.get()->localeId();
-    const auto projection = impl_->projectionFor(keys);
-    for (const auto& contact : impl_->contacts) {
-      if (contactMatchesName(*contact, name, localeId)) out.push_back(projection->share(contact));
-    }
-    if (!out.empty()) Impl::reportUnknownKey(*projection, error);
-  } catch (const std::exception& e) {
-    if (error != nullptr) *error = e.what();
-    out.clear();
-  }
-  return out;
+  return impl_->withName(name, keys, error);
+}
+std::vector<std::shared_ptr<const Contact>> VCardContactStore::unifiedContactsMatchingName(std::string_view name,
+                                                                                         const ContactKeySet& keys,
+                                                                                         std::string* error) {
+  return impl_->withName(name, keys, error);
 }
 
 }  // namespace kyn::platform

@@ -33,6 +33,17 @@ class VCardContactStore final : public ContactStore {
   std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(std::string_view name,
                                                                           const ContactKeys& keys,
                                                                           std::string* error) override;
+  std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingEmailAddress(std::string_view emailAddress,
+                                                                                  const ContactKeySet& keys,
+                                                                                  std::string* error) override;
+  std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingPhoneNumber(std::string_view phoneNumber,
+                                                                                 const ContactKeySet& keys,
+                                                                                 std::string* error) override;
+  std::shared_ptr<const Contact> unifiedContactWithIdentifier(std::string_view identifier, const ContactKeySet& keys,
+                                                              std::string* error) override;
+  std::vector<std::shared_ptr<const Contact>> unifiedContactsMatchingName(std::string_view name,
+                                                                          const ContactKeySet& keys,
+                                                                          std::string* error) override;
 
   /// Loads now (otherwise the first look-up does). Returns the number of unified contacts.
   std::size_t load();

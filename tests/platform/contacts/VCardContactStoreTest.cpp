@@ -148,6 +148,22 @@ TEST_F(VCardContactStoreTest, LookUpsReturnOnlyTheRequestedKeys) {
   EXPECT_NE(error.find("noSuchKey"), std::string::npos);  // reported, and still answered
   EXPECT_FALSE(store.unifiedContactWithIdentifier("id-2", kAllKeys, nullptr));
   EXPECT_FALSE(store.unifiedContactWithIdentifier("", kAllKeys, nullptr));
+
+  // A prepared set is projected by its own keys, also after other keys were asked for in between.
+  const ContactKeySet givenOnly({std::string(ContactKey::GivenName)});
+  const ContactKeySet all(kAllKeys);
+  for (int round = 0; round < 2; ++round) {
+    const auto given = store.unifiedContactWithIdentifier("id-1", givenOnly, nullptr);
+    ASSERT_TRUE(given);
+    EXPECT_EQ(given->givenName, "Zoe");
+    EXPECT_TRUE(given->emailAddresses.empty());
+    const auto byAddress = store.unifiedContactsMatchingEmailAddress("ZOE@example.com", all, nullptr);
+    ASSERT_EQ(byAddress.size(), 1u);
+    EXPECT_EQ(byAddress[0]->emailAddresses.size(), 1u);
+    EXPECT_FALSE(byAddress[0]->note);
+    EXPECT_TRUE(store.unifiedContactsMatchingPhoneNumber("+15035550120", givenOnly, nullptr)[0]->phoneNumbers.empty());
+    EXPECT_EQ(store.unifiedContactWithIdentifier("id-1", {std::string(ContactKey::Note)}, nullptr)->note, "private");
+  }
 }
 
 TEST_F(VCardContactStoreTest, BadFilesAndCardsAreLoggedOnceAndTheRestStillWorks) {
