@@ -20,7 +20,8 @@ Contact sample() {
 }
 
 TEST(ContactProjection, TheFullNameDescriptorBringsEveryNamePartAndAWholeContactIsShared) {
-  const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys)});
+  // A key that names nothing is passed over, also where no one asks to hear of it.
+  const Contact named = projectContact(sample(), {std::string(ContactKey::FullNameFormatterKeys), "noSuchKey"});
   EXPECT_EQ(fullNameOfContact(named, "en_US"), fullNameOfContact(sample(), "en_US"));
   EXPECT_FALSE(named.note);
   // A contact that holds nothing the keys drop is shared as it is; one that does is copied without it.

@@ -65,21 +65,21 @@ TEST_F(VCardContactStoreTest, CardsWithOneIdentifierAreOneContact) {
   book.write("1.vcf", test::vcard("UID:u-1\r\nN:;Ann\r\nTEL;TYPE=CELL:+1 503 555 0110\r\nEMAIL:ann@example.com\r\n" +
                            photo));
   book.write("2.vcf", test::vcard("UID:other\r\nFN:Someone Else\r\n"));
-  book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
+  book.write("3.vcf", test::vcard("UID:u-1\r\nFN:Ann Example\r\nN:Other;Name;;Dr.;III\r\nTITLE:Pilot\r\nORG:Air;Ops\r\nX-MAIDENNAME:Sample\r\n"
                            "X-PHONETIC-MIDDLE-NAME:Ree\r\nX-PHONETIC-LAST-NAME:Ek\r\nNOTE:n\r\nNICKNAME:Annie\r\n"
                            "TEL;TYPE=CELL:+1 503 555 0110\r\nTEL;TYPE=HOME:+1 503 555 0110\r\nEMAIL:ann@example.org\r\n"
                            "PHOTO;ENCODING=b:iVBORw==\r\n"));
   VCardContactStore store(book.path(), "us");
   EXPECT_EQ(store.load(), 2u);
-  const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "jobTitle", "previousFamilyName",
+  const auto ann = store.unifiedContactWithIdentifier("u-1", {"givenName", "familyName", "namePrefix", "jobTitle", "previousFamilyName",
                                                               "note", "nickname", "nameSuffix", "phoneticMiddleName", "phoneticFamilyName", "organizationName", "departmentName", "phoneNumbers", "emailAddresses", "imageData"},
                                                       nullptr);
   ASSERT_TRUE(ann);
   // The first card's given name; the rest only the later card has.
-  EXPECT_EQ((std::vector{ann->givenName, ann->familyName, ann->jobTitle, ann->previousFamilyName, ann->note, ann->nickname,
+  EXPECT_EQ((std::vector{ann->givenName, ann->familyName, ann->namePrefix, ann->jobTitle, ann->previousFamilyName, ann->note, ann->nickname,
                          ann->nameSuffix, ann->phoneticMiddleName, ann->phoneticFamilyName, ann->organizationName,
                          ann->departmentName}),
-            (std::vector<std::optional<std::string>>{"Ann", "Other", "Pilot", "Sample", "n", "Annie", "III", "Ree", "Ek",
+            (std::vector<std::optional<std::string>>{"Ann", "Other", "Dr.", "Pilot", "Sample", "n", "Annie", "III", "Ree", "Ek",
                                                      "Air", "Ops"}));
   EXPECT_EQ(ann->phoneNumbers, (std::vector<LabeledValue>{{"mobile", "+1 503 555 0110"}, {"home", "+1 503 555 0110"}}));
   EXPECT_EQ(ann->emailAddresses.size(), 2u);
